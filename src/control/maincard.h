@@ -1,0 +1,186 @@
+#pragma once
+
+#include "control/progress.h"
+#include "control/services.h"
+
+#include <QPointer>
+#include <QVariant>
+#include <QVariantMap>
+#include <QWidget>
+#include <memory>
+
+class QLabel;
+class QFrame;
+class QTabWidget;
+
+namespace Ui {
+class MainCardForm;
+}
+
+namespace tagora {
+
+class CommonDialog;
+
+// What the control hands to a dialog before it opens it.
+struct SharedDialogState {
+    QString dataFolder;
+    short labelProgram = 0;
+    QString itemRangeCriteria;
+    bool itemTextRtl = false;
+    QPointer<QObject> objectRef;
+};
+
+// The label printing control: ten tabs of settings and commands, a status line
+// and a progress bar, and the public methods a host drives it with. The
+// controls are the settings: every command reads its values from them.
+class MainCard : public QWidget, public ProgressSink {
+    Q_OBJECT
+public:
+    // The creation steps run here, with the services given (or the defaults).
+    explicit MainCard(QWidget* parent = nullptr, Services services = {});
+    ~MainCard() override;
+
+    // ---- Public automation methods, in their published order ----
+    Q_INVOKABLE void cmdPrintItmes_Click();
+    Q_INVOKABLE void cmdSelectItems_Click();
+    Q_INVOKABLE short GetOLEOption();
+    Q_INVOKABLE short RunOLE(const QString& DefaultLabelName, short Copies, uchar pQueryType, short pServerType,
+                             const QString& pDBName, bool pPrintHeadLab, bool ByPlate = false);
+    Q_INVOKABLE void SetGetRegPrm(uchar Action, const QString& pRegApp, const QString& pRegSection,
+                                  const QString& pParName, QObject* pObjRef, uchar pObjType, const QVariant& pDefault);
+    Q_INVOKABLE void SetGetRegParams(uchar MySection, uchar Action);
+    Q_INVOKABLE QVariant BuildItemQuery(uchar pQueryType, uchar pOrderBy);
+    Q_INVOKABLE void ClearMessage();
+    Q_INVOKABLE void FillCmbPriceField();
+    Q_INVOKABLE short ReadAlterKeyPRIORITY(const QString& CompPath, const QString& pDBFullName,
+                                           const QVariant& pFromItemSort, const QVariant& pToItemSort, bool pByDocs,
+                                           const QString& pTableName);
+    Q_INVOKABLE short ReadAlterKeySupPRIORITY(const QString& CompPath, const QString& pDBFullName,
+                                              const QVariant& pFromItemSort, const QVariant& pToItemSort,
+                                              bool pByDocs, const QString& pTableName);
+    Q_INVOKABLE QString BuildDocRangeCriteria(const QVariantMap& rsDT, const QVariant& FromDate,
+                                              const QVariant& ToDate, const QString& FromDocNum,
+                                              const QString& ToDocNum, int Indx, bool pIncludeDraft);
+    Q_INVOKABLE QString BuildItemByDocCriteria(const QString& HeadTable, const QString& LineTable,
+                                               const QString& FldID);
+    Q_INVOKABLE short ImportItemsByDocs(const QString& WizPath, const QString& MyDBName,
+                                        const QVariant& pFromItemKey, const QVariant& pToItemKey, short UseFName,
+                                        short pCopies, int pPriceField, bool pImportPackUnits, bool pByDocs);
+    Q_INVOKABLE short ReadItemPriority(const QString& CompPath, const QString& pDBPath,
+                                       const QVariant& pFromItemSort, const QVariant& pToItemSort, short GetForeign,
+                                       short pCopies, int pPriceField, bool pImportPackUnits, bool pByDocs,
+                                       bool pWithWhouseData);
+    Q_INVOKABLE void UpdateMainItemTables(const QString& pTempItemDB);
+    Q_INVOKABLE void FillCmbUser();
+    Q_INVOKABLE short ReadLabelDefPriority(const QString& CompPath, const QString& pDBPath);
+    Q_INVOKABLE int GetUserNum();
+    Q_INVOKABLE short ReadLabelDataPriority(const QString& CompPath, const QString& pDBPath);
+    Q_INVOKABLE QVariant BuildItemQueryFromPlate(uchar pQueryType, uchar pOrderBy);
+    Q_INVOKABLE short ReadPriceListPriority(const QString& CompPath, const QString& pDBFullName,
+                                            const QVariant& pFromItemSort, const QVariant& pToItemSort, bool pByDocs,
+                                            const QString& pTableName);
+    Q_INVOKABLE int ReadStockPriority(const QString& CompPath, const QString& pDBName, short DocTypeID,
+                                      const QVariantMap& rsDT, const QVariant& FromDate, const QVariant& ToDate,
+                                      bool pDraftDocs = false, bool pWithExport = false);
+    Q_INVOKABLE short ReadAlterPricePRIORITY(const QString& CompPath, const QString& pDBFullName,
+                                             const QVariant& pFromItemSort, const QVariant& pToItemSort,
+                                             bool pByDocs, const QString& pTableName);
+    Q_INVOKABLE void CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType,
+                                   uchar pOrderBy);
+    Q_INVOKABLE short ReadPriceListNamePriority(const QString& CompPath, const QString& pDBPath);
+    Q_INVOKABLE void CreateListFile(const QString& pFileName, const QString& pDBName, uchar pQueryType,
+                                    uchar pOrderBy);
+    Q_INVOKABLE short ReadItemFName(const QString& CompPath, const QString& pDBPath, const QVariant& pFromItemSort,
+                                    const QVariant& pToItemSort, bool pByDocs);
+    Q_INVOKABLE void UpdateDocsAlterKeys(const QString& pTempItemDB);
+
+    // ---- For hosts and the rest of the system ----
+    // The steps of creation and of showing; showing also runs on every show event.
+    void UserControl_InitProperties();
+    void UserControl_Show();
+
+    // A control of the screen by its name ("txtDBPath", "OptOLE(3)").
+    QObject* control(const QString& name) const;
+    template <class T> T* control(const QString& name) const { return qobject_cast<T*>(control(name)); }
+
+    // Status line and progress bar.
+    void setMessage(const QString& text) override;
+    void setProgress(double fraction) override;
+    QString message() const;
+    double progress() const { return m_progress; }
+
+    const Services& services() const { return m_services; }
+    const SharedDialogState& sharedState() const { return m_shared; }
+
+    // The data folder joined with one of the database file names.
+    QString dataFile(const QString& fileName) const;
+
+    // Item range criteria of the labels-by-items tab: " And ItemKey >= '..'" and so on.
+    QString itemRangeCriteria() const;
+
+signals:
+    // Every change of the status line text.
+    void messageChanged(const QString& text);
+
+protected:
+    void showEvent(QShowEvent* event) override;
+    bool eventFilter(QObject* watched, QEvent* event) override;
+
+private:
+    void renameControlArrays();
+    void buildFieldRows();
+    void connectHandlers();
+    void applyProgressGeometry();
+
+    // Creation and show-time hooks.
+    void LoadConnParams();
+    void FillPrinterList();
+    bool TestConnection();
+    void SetGetLabelDefs(int action);
+    bool SaveSection(int section);
+
+    // Handlers of the screen.
+    void MainTab_Click(int tab);
+    void CmdDir_Click(int index);
+    void cmdPreview_Click(int index);
+    void cmdPrintDocButt_Click();
+    void cmdUpgrade_Click();
+    void lblVarNum_Click(int row);
+    void LblToDate_Click();
+    void txtFromDocNum_Change();
+    void stepPicture_Click(const QString& buttonName);
+    void cmdSelectDocItems_Click();
+    void CmdDocType_Click();
+    void cmdRanges_Click();
+    void cmdAccDef_Click();
+    void cmdAlterKeys_Click();
+    void cmdEditItems_Click();
+    void cmdLabDesign_Click();
+    void CmdConnect_Click();
+    void CmdImportItems_Click();
+    void cmdImportDocs_Click();
+    void cmdLabByPlate_Click();
+    void cmdSaveDef_Click(int section);
+
+    void printLabels(int queryType);
+
+    // Work that other parts of the system do for the commands above.
+    bool CreateTempDocsDB(const QString& path, QString* error);
+    bool UpgradeAccountDef(const QString& path, QString* error);
+    void SetDefaultPrinter(const QString& printer);
+    void SetBrowserPrinter(const QString& printer);
+    void PrintDirectLabels(uchar queryType, const QString& dbPath);
+    void ShowItemList(uchar queryType, const QString& dbPath);
+    void ImportItems();
+    void ImportDocuments();
+    void PrintFromLabelList();
+    void showDialog(const QString& formName);
+
+    std::unique_ptr<Ui::MainCardForm> ui;
+    Services m_services;
+    CommonDialog* m_fileDialog = nullptr;
+    SharedDialogState m_shared;
+    double m_progress = 0.0;
+};
+
+} // namespace tagora

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <QString>
+
+namespace tagora {
+
+// Where long work reports: the status line and the progress bar of the main
+// control. Importers and printers take this rather than the widget, so they
+// run the same under a screen, the headless host and the tests.
+class ProgressSink {
+public:
+    virtual ~ProgressSink() = default;
+    virtual void setMessage(const QString& text) = 0;
+    // Done fraction from 0 (nothing shown) to 1 (full bar).
+    virtual void setProgress(double fraction) = 0;
+};
+
+// For callers that have nowhere to report.
+class NullProgress : public ProgressSink {
+public:
+    void setMessage(const QString&) override {}
+    void setProgress(double) override {}
+};
+
+} // namespace tagora

@@ -1,0 +1,171 @@
+// The headless host as scripts and acceptance checks use it: a real process
+// with a private settings file.
+#include <QDir>
+#include <QFile>
+#include <QProcess>
+#include <QSettings>
+#include <QTemporaryDir>
+#include <QtTest>
+
+namespace {
+struct Run {
+    int exitCode = -1;
+    QStringList out;
+    QStringList err;
+};
+
+Run runCli(const QString& settings, const QStringList& args, const QByteArray& input = {})
+{
+    QProcess p;
+    QProcessEnvironment env = QProcessEnvironment::systemEnvironment();
+    // Keep the user's own folders out of reach.
+    const QString home = QFileInfo(settings).absolutePath();
+    env.insert("HOME", home);
+    env.insert("XDG_CONFIG_HOME", home + "/config");
+    env.insert("XDG_DATA_HOME", home + "/data");
+    env.remove("TAGORA_SETTINGS");
+    p.setProcessEnvironment(env);
+    p.start(qEnvironmentVariable("TAGORA_CLI"), QStringList{"--settings", settings} + args);
+    if (!input.isEmpty())
+        p.write(input);
+    p.closeWriteChannel();
+    p.waitForFinished(60000);
+    Run r;
+    r.exitCode = p.exitStatus() == QProcess::NormalExit ? p.exitCode() : -1;
+    const QString out = QString::fromUtf8(p.readAllStandardOutput());
+    const QString err = QString::fromUtf8(p.readAllStandardError());
+    r.out = out.split('\n', Qt::SkipEmptyParts);
+    r.err = err.split('\n', Qt::SkipEmptyParts);
+    return r;
+}
+} // namespace
+
+class TestCli : public QObject {
+    Q_OBJECT
+    QTemporaryDir dir;
+    QString settings() const { return dir.filePath("cli.ini"); }
+
+private slots:
+    void init() { QFile::remove(settings()); }
+
+    void verbs_data()
+    {
+        QTest::addColumn<QStringList>("args");
+        QTest::addColumn<QStringList>("out");
+        QTest::newRow("empty store") << QStringList{"get", "OptOLE(0)", "get", "txtCopies", "get", "chkItmRTL"}
+                                     << QStringList{"True", "1", "1"};
+        QTest::newRow("option") << QStringList{"set", "OptOLE(3)", "True", "get", "OptOLE(0)", "call", "GetOLEOption"}
+                                << QStringList{"False", "6"};
+        QTest::newRow("list by position") << QStringList{"set", "cmbQtyFrom", "3", "get", "cmbQtyFrom"}
+                                          << QStringList{"3"};
+        QTest::newRow("property suffix") << QStringList{"get", "cmbQtyFrom.ListCount", "get", "LblFldName(11).Tag",
+                                                        "get", "cmbQtyFrom.Text"}
+                                         << QStringList{"5", "2", QString::fromUtf8("הכמות בשורה כפול:")};
+        QTest::newRow("clickable caption") << QStringList{"click", "lblVarNum(3)", "click", "lblVarNum(3)", "get",
+                                                          "lblVarNum(3)"}
+                                           << QStringList{"2"};
+        QTest::newRow("change mirrors") << QStringList{"set", "txtFromDocNum", "77", "get", "txtToDocNum"}
+                                        << QStringList{"77"};
+        QTest::newRow("file dialog") << QStringList{"--file", "/labels/a b.lbl", "click", "CmdDir(1)", "get",
+                                                    "txtLabelName"}
+                                     << QStringList{"/labels/a b.lbl"};
+        QTest::newRow("method with result") << QStringList{"call", "GetUserNum", "call", "ClearMessage", "get",
+                                                           "Message1"}
+                                            << QStringList{"0", ""};
+        QTest::newRow("status line") << QStringList{"set", "txtDBPath", "/nonexistent", "click", "cmdUpgrade"}
+                                     << QStringList{QString::fromUtf8("השדרוג נכשל")};
+    }
+    void verbs()
+    {
+        QFETCH(QStringList, args);
+        QFETCH(QStringList, out);
+        const Run r = runCli(settings(), args);
+        QCOMPARE(r.err, QStringList());
+        QCOMPARE(r.exitCode, 0);
+        // An empty expected line stands for a value printed as an empty line.
+        QStringList expected = out;
+        expected.removeAll(QString());
+        QCOMPARE(r.out, expected);
+    }
+
+    // The save buttons write only when the ERP's price lists are there.
+    void savePersists_data()
+    {
+        QTest::addColumn<bool>("priceLists");
+        QTest::newRow("no ERP") << false;
+        QTest::newRow("price lists filled") << true;
+    }
+    void savePersists()
+    {
+        QFETCH(bool, priceLists);
+        QStringList args;
+        if (priceLists)
+            args << "additem" << "cmbPriceField" << "Base";
+        args << "set" << "txtFromItem" << "A'17" << "click" << "cmdSaveDef4";
+        QCOMPARE(runCli(settings(), args).exitCode, 0);
+        const Run again = runCli(settings(), {"get", "txtFromItem"});
+        QCOMPARE(again.out, priceLists ? QStringList{"A'17"} : QStringList{});
+        QSettings s(settings(), QSettings::IniFormat);
+        QCOMPARE(s.contains("LabelByItems/FromItem"), priceLists);
+    }
+
+    void criticalMessageSetsExitStatus()
+    {
+        // An items database that is not a database: the upgrade must fail loudly.
+        QDir(dir.path()).mkpath("data1");
+        QFile bad(dir.filePath("data1/tgrmitm.tdb"));
+        QVERIFY(bad.open(QIODevice::WriteOnly));
+        bad.write("not a database");
+        bad.close();
+        const Run r = runCli(settings(), {"set", "txtDBPath", dir.filePath("data1"), "click", "cmdUpgrade"});
+        QCOMPARE(r.exitCode, 1);
+        QVERIFY(!r.err.isEmpty());
+        QVERIFY(r.err.first().startsWith(QString::fromUtf8("תקלה: ")));
+        QCOMPARE(r.out, QStringList{QString::fromUtf8("השדרוג נכשל")});
+    }
+
+    void mistakes_data()
+    {
+        QTest::addColumn<QStringList>("args");
+        QTest::newRow("unknown control") << QStringList{"get", "txtNoSuch"};
+        QTest::newRow("unknown verb") << QStringList{"frobnicate"};
+        QTest::newRow("refused value") << QStringList{"set", "cmbQtyFrom", "9"};
+        QTest::newRow("unknown method") << QStringList{"call", "NoSuchMethod"};
+        QTest::newRow("bad argument") << QStringList{"call", "BuildItemQuery", "x", "1"};
+        QTest::newRow("missing value") << QStringList{"set", "txtCopies"};
+        QTest::newRow("not clickable") << QStringList{"click", "txtCopies"};
+    }
+    void mistakes()
+    {
+        QFETCH(QStringList, args);
+        const Run r = runCli(settings(), args);
+        QCOMPARE(r.exitCode, 2);
+        QVERIFY(!r.err.isEmpty());
+        QVERIFY(r.err.first().startsWith("tagora-cli: "));
+    }
+
+    void scriptFromStandardInput()
+    {
+        const QByteArray script = "# a selection script\n"
+                                  "set \"OptOLE(4)\" True\n"
+                                  "set txtCompanyName 'Acme \"North\" Ltd'\n"
+                                  "get txtCompanyName\n"
+                                  "call GetOLEOption\n"
+                                  "call SetGetRegParams 1 9   # an unknown action does nothing\n";
+        const Run r = runCli(settings(), {"--script", "-"}, script);
+        QCOMPARE(r.exitCode, 0);
+        QCOMPARE(r.out, QStringList({"Acme \"North\" Ltd", "7"}));
+    }
+
+    // A method with an optional last parameter stops taking arguments at the next verb.
+    void optionalArgumentsStopAtVerb()
+    {
+        const Run r = runCli(settings(), {"call", "RunOLE", "x.lbl", "1", "1", "5", "/tmp/none.tmp", "false", "get",
+                                          "txtCopies"});
+        QCOMPARE(r.exitCode, 0);
+        QCOMPARE(r.out.last(), QString("1"));
+    }
+};
+
+QTEST_MAIN(TestCli)
+#include "tst_cli.moc"

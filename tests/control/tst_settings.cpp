@@ -1,0 +1,296 @@
+#include "support/cardfixture.h"
+
+#include "control/controlbinding.h"
+#include "control/settingstable.h"
+
+#include <QCheckBox>
+#include <QDir>
+#include <QLabel>
+#include <QLineEdit>
+#include <QPushButton>
+#include <QRadioButton>
+#include <QSettings>
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+QString get(const CardFixture& f, const QString& name)
+{
+    QObject* c = f.c(name);
+    if (!c)
+        return QStringLiteral("<missing %1>").arg(name);
+    return readBound(c, *addressKind(c)).value_or(QStringLiteral("<none>"));
+}
+
+void set(const CardFixture& f, const QString& name, const QString& value)
+{
+    QObject* c = f.c(name);
+    QVERIFY2(c, qPrintable(name));
+    QVERIFY2(writeBound(c, *addressKind(c), value), qPrintable(name + " = " + value));
+}
+
+QStringList keysOf(const QString& path, const QString& group)
+{
+    QSettings s(path, QSettings::IniFormat);
+    s.beginGroup(group);
+    return s.childKeys();
+}
+
+QString stored(const QString& path, const QString& group, const QString& key)
+{
+    QSettings s(path, QSettings::IniFormat);
+    return s.value(group + '/' + key).toString();
+}
+} // namespace
+
+class TestSettings : public QObject {
+    Q_OBJECT
+private slots:
+    void initTestCase() { QStandardPaths::setTestModeEnabled(true); }
+
+    void firstStartDefaults_data()
+    {
+        QTest::addColumn<QString>("control");
+        QTest::addColumn<QString>("expected");
+        const QString label = QDir::homePath() + "/mylabel.lbl";
+        QTest::newRow("NiceLabel chosen") << "OptOLE(0)" << "True";
+        QTest::newRow("Direct not chosen") << "OptOLE(3)" << "False";
+        QTest::newRow("Roll chosen") << "OptPrinter(1)" << "True";
+        QTest::newRow("Sheets not chosen") << "OptPrinter(0)" << "False";
+        QTest::newRow("copies") << "txtCopies" << "1";
+        QTest::newRow("price format") << "txtPriceFormat" << "0.00";
+        QTest::newRow("delay") << "txtPrintDelay" << "0";
+        QTest::newRow("label file") << "txtLabelName" << label;
+        QTest::newRow("document label file") << "txtLabelName2" << label;
+        QTest::newRow("header label file") << "txtLabelNameHead" << label;
+        QTest::newRow("run label mirrors default") << "lblLabelName(1)" << label;
+        QTest::newRow("from date") << "txtFromDate" << "01/01/1980";
+        QTest::newRow("to date") << "txtToDate" << "01/01/2025";
+        QTest::newRow("items right to left") << "chkItmRTL" << "1";
+        QTest::newRow("company") << "txtCompanyName" << QString::fromUtf8("ונמר מערכות מידע");
+        QTest::newRow("qty factor") << "txtQtyFactor" << "1";
+        QTest::newRow("no default printer") << "cmbPrinter.ListIndex" << "-1";
+        QTest::newRow("user list empty") << "cmbUser" << "-1";
+        QTest::newRow("no variable number") << "lblVarNum(7)" << "";
+        QTest::newRow("data folder")
+            << "txtDBPath" << QStandardPaths::writableLocation(QStandardPaths::GenericDataLocation) + "/tagora";
+    }
+    void firstStartDefaults()
+    {
+        QFETCH(QString, control);
+        QFETCH(QString, expected);
+        // Printers exist, but the stored default "-1" names none of them.
+        CardFixture f({}, {"Office", "Zebra"});
+        if (control.endsWith(".ListIndex")) {
+            QCOMPARE(readBound(f.c(control.chopped(10)), BindKind::ListIndex).value_or("?"), expected);
+            return;
+        }
+        QCOMPARE(get(f, control), expected);
+        QCOMPARE(f.prompt->shown().size(), size_t(0));
+    }
+
+    // A stored value the control refuses leaves it as it was, and the rows
+    // after it in the section still load.
+    void refusedValueIsSkipped_data()
+    {
+        QTest::addColumn<QByteArray>("ini");
+        QTest::addColumn<QString>("refusing");
+        QTest::addColumn<QString>("unchanged");
+        QTest::addColumn<QString>("later");
+        QTest::addColumn<QString>("laterValue");
+        QTest::newRow("user beyond list") << QByteArray("[GeneralParams]\nUser=5\nPrintDelay=7\n") << "cmbUser"
+                                          << "-1" << "txtPrintDelay" << "7";
+        QTest::newRow("option not a truth")
+            << QByteArray("[GeneralParams]\nOptOLE0=maybe\nOptOLE3=True\n") << "OptOLE(0)" << "False" << "OptOLE(3)"
+            << "True";
+        QTest::newRow("check box out of range")
+            << QByteArray("[ImportItems]\nImportAlterKeys=7\nCleanItems=1\n") << "ChkImportAlterKeys" << "0"
+            << "ChkClean" << "1";
+        QTest::newRow("list position not a number")
+            << QByteArray("[ImportDocs]\nQtyFrom=abc\nQtyFactor=12\n") << "cmbQtyFrom" << "0" << "txtQtyFactor"
+            << "12";
+        QTest::newRow("printer not installed")
+            << QByteArray("[GeneralParams]\nDefPrinter=Nowhere\nItmRTL=0\n") << "cmbPrinter" << "" << "chkItmRTL"
+            << "0";
+        QTest::newRow("negative list position")
+            << QByteArray("[ImportItems]\nItemNameType=-3\nCopies=4\n") << "CmbItemNameType" << "0" << "txtCopies"
+            << "4";
+    }
+    void refusedValueIsSkipped()
+    {
+        QFETCH(QByteArray, ini);
+        QFETCH(QString, refusing);
+        QFETCH(QString, unchanged);
+        QFETCH(QString, later);
+        QFETCH(QString, laterValue);
+        CardFixture f(ini, {"Office"});
+        QCOMPARE(get(f, refusing), unchanged);
+        QCOMPARE(get(f, later), laterValue);
+    }
+
+    void storedPrinterIsChosen()
+    {
+        CardFixture f("[GeneralParams]\nDefPrinter=Zebra\n", {"Office", "Zebra"});
+        QCOMPARE(f.c<QComboBox>("cmbPrinter")->currentIndex(), 1);
+    }
+
+    void allOptionsClearMeansNoProgram()
+    {
+        CardFixture f("[GeneralParams]\nOptOLE0=False\nOptOLE1=False\nOptOLE2=False\nOptOLE3=False\nOptOLE4=False\n");
+        for (int i = 0; i < 5; ++i)
+            QVERIFY(!f.c<QRadioButton>(QStringLiteral("OptOLE(%1)").arg(i))->isChecked());
+        QCOMPARE(f.card->GetOLEOption(), short(0));
+    }
+
+    void labelVarsWritesEveryRowButExpressionsOnlyForExpressionRows()
+    {
+        CardFixture f({}, {}, {"Base price"});
+        f.c<QPushButton>("CmdSaveFields")->click();
+        const QStringList keys = keysOf(f.settingsPath, "LabelVars");
+        QCOMPARE(keys.filter(QRegularExpression("^\\d\\dFldSend$")).size(), 38);
+        QCOMPARE(keys.filter(QRegularExpression("^\\d\\dVarNum$")).size(), 38);
+        QCOMPARE(keys.filter(QRegularExpression("^\\d\\dFldExpr$")),
+                 QStringList({"33FldExpr", "34FldExpr", "35FldExpr", "36FldExpr", "37FldExpr"}));
+        QVERIFY(keys.contains("PriceFormat"));
+        QCOMPARE(keys.size(), 38 + 38 + 5 + 1);
+        QCOMPARE(stored(f.settingsPath, "LabelVars", "07VarNum"), QString());
+    }
+
+    // Without the ERP's price lists no save button may touch the store.
+    void saveButtons_data()
+    {
+        QTest::addColumn<QString>("button");
+        QTest::addColumn<QString>("section");
+        QTest::addColumn<int>("keys");
+        QTest::newRow("general") << "cmdSaveDef1" << "GeneralParams" << 16;
+        QTest::newRow("item import") << "cmdSaveDef2" << "ImportItems" << 12;
+        QTest::newRow("label vars") << "CmdSaveFields" << "LabelVars" << 82;
+        QTest::newRow("by items") << "cmdSaveDef4" << "LabelByItems" << 6;
+        QTest::newRow("by documents") << "cmdSaveDef5" << "LabelByDocs" << 9;
+        QTest::newRow("document import") << "SaveDef6" << "ImportDocs" << 2;
+        QTest::newRow("label list") << "cmdSaveDef3" << "LabelByPlate" << 2;
+    }
+    void saveButtons()
+    {
+        QFETCH(QString, button);
+        QFETCH(QString, section);
+        QFETCH(int, keys);
+        {
+            CardFixture f;
+            f.c<QPushButton>(button)->click();
+            QVERIFY(keysOf(f.settingsPath, section).isEmpty());
+            f.card->SetGetRegParams(1, 1);
+            QVERIFY(keysOf(f.settingsPath, "GeneralParams").isEmpty());
+        }
+        {
+            CardFixture f({}, {}, {"Base price"});
+            f.c<QPushButton>(button)->click();
+            QCOMPARE(keysOf(f.settingsPath, section).size(), keys);
+            // Only its own section.
+            const QStringList groups = QSettings(f.settingsPath, QSettings::IniFormat).childGroups();
+            QCOMPARE(groups, QStringList{section});
+        }
+    }
+
+    // What one instance saves, the next one shows, whatever the text holds.
+    void roundTrip()
+    {
+        const QList<std::pair<QString, QString>> values = {
+            {"txtCompanyName", QString::fromUtf8("חברת \"אלף\", בע'מ = 100%")},
+            {"OptOLE(3)", "True"},
+            {"OptPrinter(0)", "True"},
+            {"txtLabelName", "/srv/labels/it's a label.lbl"},
+            {"txtPrintDelay", "  3"},
+            {"chkItmRTL", "0"},
+            {"CmbItemNameType", "1"},
+            {"ChkImportAlterPrices", "1"},
+            {"txtFromItemSort", "@start;#1"},
+            {"lblVarNum(0)", "12"},
+            {"ChkFldSend(35)", "1"},
+            {"txtFldExpr(35)", "tItems.ItemKey || ' - ' || tItems.ItemName"},
+            {"txtPriceFormat", "#,##0.00"},
+            {"txtAccountKey", "C'100"},
+            {"txtFromDate", "15/03/2024"},
+            {"chkOnlyLine0", "1"},
+            {"cmbQtyFrom", "4"},
+            {"ChkUseAccKeyForPlate", "1"},
+            {"txtToDocNum", "\\\\server\\share"},
+        };
+        CardFixture first({}, {}, {"Base price", "Wholesale"});
+        for (const auto& [name, value] : values)
+            set(first, name, value);
+        for (const SettingSection& s : settingSections())
+            first.c<QPushButton>(s.saveButton)->click();
+
+        first.store->flush();
+        QFile saved(first.settingsPath);
+        QVERIFY(saved.open(QIODevice::ReadOnly));
+        CardFixture second(saved.readAll(), {}, {"Base price"});
+        for (const auto& [name, value] : values)
+            QCOMPARE(get(second, name), value);
+        QCOMPARE(second.card->GetOLEOption(), short(6));
+    }
+
+    void handWrittenFile()
+    {
+        // What an administrator might type: an unquoted comma, Hebrew, no quoting at all.
+        CardFixture f(QByteArray("[GeneralParams]\nCompanyName=Acme, Ltd\n[LabelVars]\n05FldSend=1\n05VarNum=3\n")
+                      + QString::fromUtf8("[LabelByItems]\nAccountKey=לקוח 7\n").toUtf8());
+        QCOMPARE(get(f, "txtCompanyName"), QString("Acme, Ltd"));
+        QCOMPARE(get(f, "ChkFldSend(5)"), QString("1"));
+        QCOMPARE(get(f, "lblVarNum(5)"), QString("3"));
+        QCOMPARE(get(f, "txtAccountKey"), QString::fromUtf8("לקוח 7"));
+    }
+
+    void corruptFileGivesDefaultsAndIsNotOverwritten()
+    {
+        QByteArray garbage("[GeneralParams\n\x01\x02\xff\xfe=\n=====\n[\n");
+        garbage += QByteArray(2000, '\0');
+        CardFixture f(garbage, {}, {"Base price"});
+        QCOMPARE(get(f, "txtCopies"), QString("1"));
+        QCOMPARE(get(f, "OptOLE(0)"), QString("True"));
+        f.c<QPushButton>("cmdSaveDef2")->click();
+        f.store->flush();
+        QFile file(f.settingsPath);
+        QVERIFY(file.open(QIODevice::ReadOnly));
+        QCOMPARE(file.readAll(), garbage);
+        QVERIFY(!f.card->message().isEmpty());
+    }
+
+    void regPrmIgnoresUnknownKindAndAction_data()
+    {
+        QTest::addColumn<int>("action");
+        QTest::addColumn<int>("kind");
+        QTest::newRow("kind 4") << 1 << 4;
+        QTest::newRow("kind 0") << 1 << 0;
+        QTest::newRow("action 3") << 3 << 1;
+        QTest::newRow("action 0") << 0 << 1;
+    }
+    void regPrmIgnoresUnknownKindAndAction()
+    {
+        QFETCH(int, action);
+        QFETCH(int, kind);
+        CardFixture f;
+        f.card->SetGetRegPrm(uchar(action), "Tagora", "Extra", "Key", f.c("txtCopies"), uchar(kind), QVariant(9));
+        f.card->SetGetRegPrm(uchar(action == 1 ? 2 : action), "Tagora", "Extra", "Key", f.c("txtCopies"),
+                             uchar(kind), QVariant(9));
+        f.store->flush();
+        QVERIFY(keysOf(f.settingsPath, "Extra").isEmpty());
+        QCOMPARE(get(f, "txtCopies"), QString("1"));
+    }
+
+    void regPrmOtherApplication()
+    {
+        CardFixture f;
+        f.card->SetGetRegPrm(2, "OtherApp", "S", "K", f.c("txtCopies"), 1, QVariant(42));
+        QCOMPARE(get(f, "txtCopies"), QString("42"));
+        f.card->SetGetRegPrm(1, "OtherApp", "S", "K", f.c("txtCopies"), 1, QVariant());
+        f.store->flush();
+        QCOMPARE(stored(f.settingsPath, "OtherApp/S", "K"), QString("42"));
+        QVERIFY(keysOf(f.settingsPath, "S").isEmpty());
+    }
+};
+
+QTEST_MAIN(TestSettings)
+#include "tst_settings.moc"

@@ -1,0 +1,49 @@
+#pragma once
+
+// A control wired to a private settings file, a scripted prompt and file
+// dialog, and a fixed printer list, as every control test needs.
+#include "control/commondialog.h"
+#include "control/maincard.h"
+#include "control/printercatalog.h"
+#include "control/prompt.h"
+#include "control/settingsstore.h"
+
+#include <QComboBox>
+#include <QFile>
+#include <QStandardPaths>
+#include <QTemporaryDir>
+#include <memory>
+
+struct CardFixture {
+    QTemporaryDir dir;
+    QString settingsPath;
+    std::shared_ptr<tagora::IniSettingsStore> store;
+    std::shared_ptr<tagora::ScriptedPrompt> prompt = std::make_shared<tagora::ScriptedPrompt>(nullptr);
+    std::shared_ptr<tagora::ScriptedFileDialog> files = std::make_shared<tagora::ScriptedFileDialog>();
+    std::unique_ptr<tagora::MainCard> card;
+
+    // iniText is written to the settings file first when given; priceFields
+    // stands in for the price lists an ERP connection would have filled.
+    explicit CardFixture(const QByteArray& iniText = {}, const QStringList& printers = {},
+                         const QStringList& priceFields = {})
+    {
+        settingsPath = dir.filePath(QStringLiteral("Tagora.ini"));
+        if (!iniText.isNull()) {
+            QFile f(settingsPath);
+            f.open(QIODevice::WriteOnly);
+            f.write(iniText);
+        }
+        store = std::make_shared<tagora::IniSettingsStore>(settingsPath);
+        tagora::Services s;
+        s.settings = store;
+        s.prompt = prompt;
+        s.fileDialog = files;
+        s.printers = std::make_shared<tagora::FixedPrinterCatalog>(printers);
+        card = std::make_unique<tagora::MainCard>(nullptr, s);
+        card->control<QComboBox>(QStringLiteral("cmbPriceField"))->addItems(priceFields);
+        card->resize(1280, 600);
+        card->show();
+    }
+
+    template <class T = QObject> T* c(const QString& name) const { return card->control<T>(name); }
+};
