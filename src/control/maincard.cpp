@@ -10,6 +10,7 @@
 #include "control/settingsstore.h"
 #include "control/settingstable.h"
 #include "labels/labelfields.h"
+#include "localdb/schema.h"
 
 #include "ui_maincard.h"
 
@@ -28,10 +29,6 @@
 namespace tagora {
 
 namespace {
-const QString kItemsDb = QStringLiteral("tgrmitm.tdb");
-const QString kTempDocsDb = QStringLiteral("tgrrtdb.tmp");
-const QString kConfigDb = QStringLiteral("tagora.tdb");
-
 QString indexed(const char* base, int i)
 {
     return QStringLiteral("%1(%2)").arg(QLatin1String(base)).arg(i);
@@ -497,11 +494,15 @@ void MainCard::cmdPrintDocButt_Click()
 void MainCard::printLabels(int queryType)
 {
     const short code = GetOLEOption();
-    const QString tempDocs = dataFile(kTempDocsDb);
+    const QString tempDocs = dataFile(dbfiles::TempDocs);
+    // Labels by items need the documents database only for its links to the
+    // item tables; a first run on a new data folder gets the whole folder ready.
     if (queryType == 1 && !QFileInfo::exists(tempDocs)) {
-        QString error;
-        if (!CreateTempDocsDB(tempDocs, &error)) {
-            m_services.prompt->critical(titles::Fault, error);
+        DbError error = PrepareDataFolder(ui->txtDBPath->text());
+        if (!error)
+            CreateTempDocsDB(dataFile(dbfiles::Config), dataFile(dbfiles::Items), tempDocs, &error);
+        if (error) {
+            m_services.prompt->critical(titles::Fault, error.message);
             return;
         }
     }
@@ -526,13 +527,13 @@ void MainCard::printLabels(int queryType)
 
 void MainCard::cmdUpgrade_Click()
 {
-    const QString itemsDb = dataFile(kItemsDb);
+    const QString itemsDb = dataFile(dbfiles::Items);
     bool ok = false;
     if (QFileInfo::exists(itemsDb)) {
-        QString error;
-        ok = UpgradeAccountDef(itemsDb, &error);
+        DbError error;
+        ok = !UpgradeAccountDef(itemsDb, &error).isEmpty();
         if (!ok)
-            m_services.prompt->critical(titles::Fault, error);
+            m_services.prompt->critical(titles::Fault, error.message);
     }
     setProgress(1.0);
     setMessage(ok ? QStringLiteral("השדרוג הסתיים בהצלחה") : QStringLiteral("השדרוג נכשל"));
@@ -621,7 +622,7 @@ void MainCard::cmdLabByPlate_Click()
 
 void MainCard::cmdPreview_Click(int index)
 {
-    const QString tempDocs = dataFile(kTempDocsDb);
+    const QString tempDocs = dataFile(dbfiles::TempDocs);
     ShowItemList(index == 0 ? 2 : 1, tempDocs);
 }
 

@@ -165,8 +165,6 @@ private:
     void printLabels(int queryType);
 
     // Work that other parts of the system do for the commands above.
-    bool CreateTempDocsDB(const QString& path, QString* error);
-    bool UpgradeAccountDef(const QString& path, QString* error);
     void SetDefaultPrinter(const QString& printer);
     void SetBrowserPrinter(const QString& printer);
     void PrintDirectLabels(uchar queryType, const QString& dbPath);

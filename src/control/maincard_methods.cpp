@@ -121,18 +121,6 @@ bool MainCard::TestConnection()
 
 void MainCard::SetGetLabelDefs(int) {}
 
-bool MainCard::CreateTempDocsDB(const QString&, QString*)
-{
-    return true;
-}
-
-bool MainCard::UpgradeAccountDef(const QString&, QString* error)
-{
-    if (error)
-        *error = QStringLiteral("שדרוג בסיס הנתונים אינו זמין בגרסה זו");
-    return false;
-}
-
 void MainCard::SetDefaultPrinter(const QString&) {}
 
 void MainCard::SetBrowserPrinter(const QString&) {}

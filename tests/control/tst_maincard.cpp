@@ -3,8 +3,10 @@
 #include "control/automation.h"
 #include "control/clicklabel.h"
 #include "control/controlbinding.h"
+#include "localdb/schema.h"
 
 #include <QCheckBox>
+#include <QDir>
 #include <QGroupBox>
 #include <QLabel>
 #include <QLineEdit>
@@ -317,6 +319,48 @@ private slots:
         QCOMPARE(f.card->message(), QString::fromUtf8("השדרוג נכשל"));
         QCOMPARE(f.card->progress(), 1.0);
         QVERIFY(f.prompt->shown().empty());
+    }
+
+    void upgradeTwice()
+    {
+        CardFixture f;
+        const QString data = f.dir.filePath("data");
+        QVERIFY(QDir().mkpath(data));
+        DbError e;
+        QVERIFY(!CreateItemsDB(data + "/" + dbfiles::Items, &e).isEmpty());
+        f.c<QLineEdit>("txtDBPath")->setText(data);
+        f.c<QPushButton>("cmdUpgrade")->click();
+        QCOMPARE(f.card->message(), QString::fromUtf8("השדרוג הסתיים בהצלחה"));
+        QVERIFY(f.prompt->shown().empty());
+        f.c<QPushButton>("cmdUpgrade")->click();
+        QCOMPARE(f.card->message(), QString::fromUtf8("השדרוג נכשל"));
+        QCOMPARE(f.prompt->criticalCount(), 1);
+        QCOMPARE(f.prompt->shown().front().title, QString::fromUtf8("תקלה"));
+    }
+
+    // Labels by items make the documents database (and a new data folder) ready; by documents do not.
+    void printPreparesDataFolder_data()
+    {
+        QTest::addColumn<QString>("button");
+        QTest::addColumn<bool>("created");
+        QTest::newRow("by items") << "cmdPrintItmes" << true;
+        QTest::newRow("by documents") << "cmdPrintDocButt" << false;
+    }
+    void printPreparesDataFolder()
+    {
+        QFETCH(QString, button);
+        QFETCH(bool, created);
+        CardFixture f;
+        const QString data = f.dir.filePath("fresh");
+        f.c<QLineEdit>("txtDBPath")->setText(data);
+        f.c<QPushButton>(button)->click();
+        QCOMPARE(QFile::exists(data + "/" + dbfiles::TempDocs), created);
+        QVERIFY(f.prompt->lines().isEmpty());
+        if (!created)
+            return;
+        Database db;
+        QVERIFY(!db.open(data + "/" + dbfiles::TempDocs));
+        QVERIFY(db.prepare("SELECT * FROM tItems").isValid());
     }
 
     void progressFill()

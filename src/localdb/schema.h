@@ -1,0 +1,66 @@
+#pragma once
+
+#include "localdb/database.h"
+
+#include <QString>
+#include <vector>
+
+namespace tagora {
+
+// File names of the four local databases in the data folder.
+namespace dbfiles {
+inline const QString Config = QStringLiteral("tagora.tdb");
+inline const QString Items = QStringLiteral("tgrmitm.tdb");
+inline const QString TempDocs = QStringLiteral("tgrrtdb.tmp");
+inline const QString TempItems = QStringLiteral("tgrlabti.tmp");
+} // namespace dbfiles
+
+// Field types, kept recognisable in the declared column types.
+enum class FieldType { Boolean, Byte, Integer, Long, Double, DateTime, Text };
+
+struct FieldDef {
+    const char* name;
+    FieldType type;
+    int size = 0; // text width in characters
+};
+
+struct TableDef {
+    const char* name;
+    std::vector<FieldDef> fields;
+    std::vector<const char*> key;
+    bool autoIncrementFirst = false;
+};
+
+// The declared SQL of a field type: TEXT(25), INTEGER, SMALLINT, DOUBLE ...
+QString declaredType(const FieldDef& field);
+// CREATE TABLE text of a definition.
+QString createTableSql(const TableDef& table);
+
+// The own tables of each file the system creates, in creation order.
+const std::vector<TableDef>& tempDocsTables();
+const std::vector<TableDef>& itemsTables();
+const std::vector<TableDef>& tempItemsTables();
+
+// Builds each file from nothing: an existing file at the path is deleted
+// first. Returns the path, or empty text with the engine's error.
+QString CreateTempDocsDB(const QString& configPath, const QString& itemsPath, const QString& tempDocsPath,
+                         DbError* error);
+QString CreateItemsDB(const QString& itemsPath, DbError* error);
+QString CreateTempItemsDB(const QString& tempItemsPath, const QString& itemsPath, DbError* error);
+
+// Adds FldID, FldMaxLen and Label2Name to tAccountDef, all or nothing.
+// A missing file gives a NotFound error with "בסיס הנתונים אינו נמצא".
+QString UpgradeAccountDef(const QString& itemsPath, DbError* error);
+
+// Links a table of another file into the open database under its own name.
+DbError AttachTable(Database& db, const QString& sourcePath, const QString& table);
+
+// Makes the data folder ready for a first run: the folder, the supplied
+// configuration database and an empty (upgraded) items database, each only
+// when missing. Nothing that exists is touched.
+DbError PrepareDataFolder(const QString& folder);
+
+// Writes the supplied configuration database to path (which must not exist).
+DbError InstallConfigDatabase(const QString& path);
+
+} // namespace tagora

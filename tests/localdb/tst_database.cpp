@@ -1,0 +1,227 @@
+#include "localdb/database.h"
+
+#include <QDir>
+#include <QFile>
+#include <QTemporaryDir>
+#include <QtTest>
+
+using namespace tagora;
+
+class TestDatabase : public QObject {
+    Q_OBJECT
+    QTemporaryDir dir;
+
+    QString fresh(const QString& name)
+    {
+        const QString path = dir.filePath(name);
+        QFile::remove(path);
+        return path;
+    }
+
+private slots:
+    void initTestCase() { Database::setBusyTimeout(100); }
+
+    void valuesRoundTrip_data()
+    {
+        QTest::addColumn<QVariant>("in");
+        QTest::addColumn<QVariant>("out");
+        QTest::newRow("null") << QVariant() << QVariant();
+        QTest::newRow("true") << QVariant(true) << QVariant(qlonglong(1));
+        QTest::newRow("whole") << QVariant(-32768) << QVariant(qlonglong(-32768));
+        QTest::newRow("double") << QVariant(12.75) << QVariant(12.75);
+        QTest::newRow("hebrew") << QVariant(QString::fromUtf8("שלום \"עולם\" 'x'")) << QVariant(QString::fromUtf8("שלום \"עולם\" 'x'"));
+        // Declared widths are not limits: an ERP text longer than its field is kept whole.
+        QTest::newRow("longer than width") << QVariant(QString(300, 'x')) << QVariant(QString(300, 'x'));
+        QTest::newRow("date") << QVariant(QDate(2024, 2, 29)) << QVariant(QString("2024-02-29"));
+        QTest::newRow("date time") << QVariant(QDateTime(QDate(2024, 2, 29), QTime(13, 5, 9))) << QVariant(QString("2024-02-29 13:05:09"));
+    }
+    void valuesRoundTrip()
+    {
+        QFETCH(QVariant, in);
+        QFETCH(QVariant, out);
+        Database db;
+        QVERIFY(!db.open(fresh("values.db"), Database::OpenMode::Create));
+        QVERIFY(!db.exec("CREATE TABLE t (k TEXT(5) NOT NULL, v, CONSTRAINT PrimaryKey PRIMARY KEY (k))"));
+        Statement ins = db.prepare("INSERT INTO t (k, v) VALUES (:k, :v)");
+        QVERIFY(ins.bind(":k", "a"));
+        QVERIFY(ins.bind(":v", in));
+        QVERIFY(!ins.run());
+        Statement sel = db.prepare("SELECT v AS Value FROM t");
+        QCOMPARE(sel.step(), Statement::Step::Row);
+        QCOMPARE(sel.value("VALUE"), out);
+        QCOMPARE(sel.isNull(0), !out.isValid());
+        QCOMPARE(sel.columnIndex("nothing"), -1);
+    }
+
+    void keyViolations_data()
+    {
+        QTest::addColumn<QString>("second");
+        QTest::addColumn<bool>("duplicate");
+        QTest::newRow("same key") << "INSERT INTO t VALUES ('a', 'b', 2)" << true;
+        QTest::newRow("unique index") << "INSERT INTO t VALUES ('z', 'b', 1)" << true;
+        QTest::newRow("null key") << "INSERT INTO t VALUES (NULL, 'c', 3)" << false;
+        QTest::newRow("syntax") << "INSERT INTO t VALUES (" << false;
+    }
+    void keyViolations()
+    {
+        QFETCH(QString, second);
+        QFETCH(bool, duplicate);
+        Database db;
+        QVERIFY(!db.open(fresh("keys.db"), Database::OpenMode::Create));
+        QVERIFY(!db.exec("CREATE TABLE t (a TEXT NOT NULL, b TEXT NOT NULL, n, CONSTRAINT PrimaryKey PRIMARY KEY (a, b));"
+                         "CREATE UNIQUE INDEX tn ON t (n); INSERT INTO t VALUES ('a', 'b', 1)"));
+        const DbError e = db.exec(second);
+        QVERIFY(e.isError());
+        QCOMPARE(e.isDuplicateKey(), duplicate);
+        QVERIFY(!e.message.isEmpty());
+    }
+
+    void transactionRollsBackUnlessCommitted()
+    {
+        Database db;
+        QVERIFY(!db.open(fresh("tx.db"), Database::OpenMode::Create));
+        QVERIFY(!db.exec("CREATE TABLE t (a)"));
+        {
+            Transaction tx(db);
+            QVERIFY(!db.exec("INSERT INTO t VALUES (1)"));
+        }
+        QCOMPARE(db.scalar("SELECT count(*) FROM t").toInt(), 0);
+        {
+            Transaction tx(db);
+            QVERIFY(!db.exec("INSERT INTO t VALUES (1)"));
+            QVERIFY(!tx.commit());
+        }
+        QCOMPARE(db.scalar("SELECT count(*) FROM t").toInt(), 1);
+        QVERIFY(!db.inTransaction());
+    }
+
+    void openFailures_data()
+    {
+        QTest::addColumn<QByteArray>("content");
+        QTest::addColumn<bool>("exists");
+        QTest::addColumn<bool>("notFound");
+        QTest::newRow("missing") << QByteArray() << false << true;
+        QTest::newRow("not a database") << QByteArray("just some text, long enough to look like a file header......")
+                                        << true << false;
+        QTest::newRow("empty file is a new database") << QByteArray() << true << false;
+    }
+    void openFailures()
+    {
+        QFETCH(QByteArray, content);
+        QFETCH(bool, exists);
+        QFETCH(bool, notFound);
+        const QString path = fresh("open.db");
+        if (exists) {
+            QFile f(path);
+            QVERIFY(f.open(QIODevice::WriteOnly));
+            f.write(content);
+        }
+        Database db;
+        const DbError e = db.open(path);
+        if (exists && content.isEmpty()) {
+            QVERIFY(!e);
+            return;
+        }
+        QVERIFY(e.isError());
+        QCOMPARE(e.kind == DbError::Kind::NotFound, notFound);
+        QVERIFY(e.message.contains(QDir::toNativeSeparators(path)));
+        QVERIFY(!db.isOpen());
+        if (exists) {
+            QFile f(path);
+            QVERIFY(f.open(QIODevice::ReadOnly));
+            QCOMPARE(f.readAll(), content);
+        }
+    }
+
+    void lockedFileFailsInsteadOfHanging()
+    {
+        const QString path = fresh("locked.db");
+        Database holder;
+        QVERIFY(!holder.open(path, Database::OpenMode::Create));
+        QVERIFY(!holder.exec("CREATE TABLE t (a); BEGIN EXCLUSIVE; INSERT INTO t VALUES (1)"));
+        Database other;
+        const DbError e = other.open(path);
+        QVERIFY(e.isError());
+        QVERIFY(e.message.contains("locked"));
+        holder.exec("ROLLBACK");
+    }
+
+    void linksAndQueries()
+    {
+        const QString src = fresh("source.db");
+        {
+            Database s;
+            QVERIFY(!s.open(src, Database::OpenMode::Create));
+            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT, Price DOUBLE); INSERT INTO tItems VALUES ('A', 1)"));
+        }
+        const QString path = fresh("linking.db");
+        {
+            Database db;
+            QVERIFY(!db.open(path, Database::OpenMode::Create));
+            QVERIFY(!db.attachTable(src, "tItems"));
+            QVERIFY(!db.createQuery("qCheap", "SELECT ItemKey FROM tItems WHERE Price < 5"));
+            QVERIFY(!db.createQuery("qRaise", "UPDATE tItems SET Price = Price + 10"));
+            const DbError bad = db.createQuery("qBroken", "SELECT FROM WHERE");
+            QVERIFY(bad.isError());
+            QCOMPARE(db.queryNames(), QStringList({"qCheap", "qRaise"}));
+        }
+        Database db;
+        QVERIFY(!db.open(path));
+        QCOMPARE(db.scalar("SELECT ItemKey FROM qCheap").toString(), QString("A"));
+        int changed = 0;
+        QVERIFY(!db.runQuery("qRaise", &changed));
+        QCOMPARE(changed, 1);
+        QCOMPARE(db.scalar("SELECT count(*) FROM qCheap").toInt(), 0);
+        QVERIFY(db.runQuery("qNoSuch").isError());
+        db.close();
+        Database s;
+        QVERIFY(!s.open(src));
+        QCOMPARE(s.scalar("SELECT Price FROM tItems").toDouble(), 11.0);
+    }
+
+    void linkTargetChecked_data()
+    {
+        QTest::addColumn<bool>("fileExists");
+        QTest::newRow("file without the table") << true;
+        QTest::newRow("no such file") << false;
+    }
+    void linkTargetChecked()
+    {
+        QFETCH(bool, fileExists);
+        const QString src = fresh("empty-source.db");
+        if (fileExists) {
+            Database s;
+            QVERIFY(!s.open(src, Database::OpenMode::Create));
+            QVERIFY(!s.exec("CREATE TABLE other (a)"));
+        }
+        Database db;
+        QVERIFY(!db.open(fresh("l.db"), Database::OpenMode::Create));
+        const DbError e = db.attachTable(src, "tItems");
+        QCOMPARE(e.kind, DbError::Kind::NotFound);
+        QVERIFY(e.message.contains("tItems"));
+        QVERIFY(db.links().empty());
+    }
+
+    // A copied or moved data folder keeps its links working.
+    void movedFolderFindsSiblingSource()
+    {
+        QTemporaryDir a;
+        {
+            Database s;
+            QVERIFY(!s.open(a.filePath("items.db"), Database::OpenMode::Create));
+            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('moved')"));
+            Database db;
+            QVERIFY(!db.open(a.filePath("docs.db"), Database::OpenMode::Create));
+            QVERIFY(!db.attachTable(a.filePath("items.db"), "tItems"));
+        }
+        QTemporaryDir b;
+        QVERIFY(QFile::rename(a.filePath("items.db"), b.filePath("items.db")));
+        QVERIFY(QFile::rename(a.filePath("docs.db"), b.filePath("docs.db")));
+        Database db;
+        QVERIFY(!db.open(b.filePath("docs.db")));
+        QCOMPARE(db.scalar("SELECT ItemKey FROM tItems").toString(), QString("moved"));
+    }
+};
+
+QTEST_GUILESS_MAIN(TestDatabase)
+#include "tst_database.moc"

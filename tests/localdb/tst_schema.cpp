@@ -1,0 +1,302 @@
+#include "localdb/database.h"
+#include "localdb/schema.h"
+
+#include <QDir>
+#include <QFile>
+#include <QTemporaryDir>
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+QStringList columnsOf(const Database& db, const QString& table, bool keyOnly = false)
+{
+    QStringList out;
+    // table_info gives pk positions 1..n for key columns.
+    Statement s = db.prepare(QStringLiteral("SELECT name, pk FROM pragma_table_info('%1') %2")
+                                 .arg(table, keyOnly ? QStringLiteral("WHERE pk > 0 ORDER BY pk") : QString()));
+    while (s.step() == Statement::Step::Row)
+        out << s.value(0).toString();
+    return out;
+}
+
+QStringList linkNames(const Database& db)
+{
+    QStringList out;
+    for (const auto& [name, source] : db.links())
+        out << name;
+    return out;
+}
+} // namespace
+
+class TestSchema : public QObject {
+    Q_OBJECT
+    QTemporaryDir dir;
+    QString folder;
+
+    QString path(const QString& name) const { return QDir(folder).filePath(name); }
+
+private slots:
+    void initTestCase()
+    {
+        Database::setBusyTimeout(100);
+        folder = dir.filePath("data");
+        QVERIFY2(!PrepareDataFolder(folder), "data folder");
+    }
+
+    void preparedFolderHasTheThreeFiles()
+    {
+        for (const QString& f : {dbfiles::Config, dbfiles::Items})
+            QVERIFY2(QFile::exists(path(f)), qPrintable(f));
+        Database config;
+        QVERIFY(!config.open(path(dbfiles::Config)));
+        QCOMPARE(config.scalar("SELECT count(*) FROM qSelectDocTypes").toInt(), 6);
+        QCOMPARE(config.scalar("SELECT count(*) FROM qWizFileRanges").toInt(), 6);
+        // The items database comes upgraded.
+        Database items;
+        QVERIFY(!items.open(path(dbfiles::Items)));
+        QCOMPARE(columnsOf(items, "tAccountDef").mid(5), QStringList({"FldID", "FldMaxLen", "Label2Name"}));
+    }
+
+    void preparingAgainTouchesNothing()
+    {
+        {
+            Database items;
+            QVERIFY(!items.open(path(dbfiles::Items)));
+            QVERIFY(!items.exec("INSERT INTO tItems (ItemKey) VALUES ('KEEP')"));
+        }
+        QVERIFY(!PrepareDataFolder(folder));
+        Database items;
+        QVERIFY(!items.open(path(dbfiles::Items)));
+        QCOMPARE(items.scalar("SELECT count(*) FROM tItems WHERE ItemKey='KEEP'").toInt(), 1);
+        QVERIFY(!items.exec("DELETE FROM tItems"));
+    }
+
+    // Each creation starts from nothing: built twice, the file holds exactly
+    // its tables, links and queries, and no rows.
+    void recreation_data()
+    {
+        QTest::addColumn<QString>("file");
+        QTest::addColumn<QStringList>("tables");
+        QTest::addColumn<QStringList>("links");
+        QTest::addColumn<QStringList>("queries");
+        QTest::newRow("documents")
+            << dbfiles::TempDocs
+            << QStringList{"tTempDocHeaders", "tTempDocLines", "tTempLineMore", "tAgents", "tPLabData", "tPLabDef", "tPLName"}
+            << QStringList{"tDocTypes", "tCSTable", "tCurrencies", "tWizFiles", "tWizFileRanges",
+                           "tItems", "tAlterKeys", "tAlterPrices", "tPriceList", "tAccountDef"}
+            << QStringList{"qSelectDocHeaders", "qSelectDocLines", "qDocTypes"};
+        QTest::newRow("items") << "items-copy.tdb"
+                               << QStringList{"tItems", "tAlterKeys", "tAlterPrices", "tAccountDef", "tPriceList"}
+                               << QStringList{} << QStringList{"qSelectItems", "qSelectMarkedItems", "qEditItems"};
+        QTest::newRow("staging") << dbfiles::TempItems
+                                 << QStringList{"tTempItems", "tTempAlterKeys", "tTempAlterPrices", "tTempPriceList"}
+                                 << QStringList{"tItems", "tAlterKeys", "tAlterPrices", "tPriceList"}
+                                 << QStringList{"qAddUpdateAlterKeys", "qAddUpdateAlterPrices", "qAddUpdatePriceList"};
+    }
+    void recreation()
+    {
+        QFETCH(QString, file);
+        QFETCH(QStringList, tables);
+        QFETCH(QStringList, links);
+        QFETCH(QStringList, queries);
+        const QString target = path(file);
+        for (int round = 0; round < 2; ++round) {
+            DbError e;
+            QString made;
+            if (file == dbfiles::TempDocs)
+                made = CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), target, &e);
+            else if (file == dbfiles::TempItems)
+                made = CreateTempItemsDB(target, path(dbfiles::Items), &e);
+            else
+                made = CreateItemsDB(target, &e);
+            QVERIFY2(!e, qPrintable(e.message));
+            QCOMPARE(made, target);
+            Database db;
+            QVERIFY(!db.open(target));
+            if (round == 0) {
+                for (const QString& t : tables) {
+                    const QStringList key = columnsOf(db, t, true);
+                    QVERIFY(!db.exec(QStringLiteral("INSERT INTO %1 (%2) VALUES (%3)")
+                                         .arg(t, key.join(','), QStringList(key.size(), "1").join(','))));
+                }
+                continue;
+            }
+            QCOMPARE(db.tableNames(), tables);
+            QCOMPARE(linkNames(db), links);
+            QCOMPARE(db.queryNames(), queries);
+            for (const QString& t : tables)
+                QCOMPARE(db.scalar(QStringLiteral("SELECT count(*) FROM %1").arg(t)).toInt(), 0);
+            // Every stored select runs.
+            for (const QString& q : queries)
+                if (db.querySql(q).startsWith("SELECT"))
+                    QVERIFY2(db.prepare(QStringLiteral("SELECT * FROM %1").arg(q)).isValid(), qPrintable(q));
+        }
+    }
+
+    void keysAndLayout_data()
+    {
+        QTest::addColumn<QString>("file");
+        QTest::addColumn<QString>("table");
+        QTest::addColumn<QStringList>("key");
+        QTest::addColumn<QString>("first");
+        QTest::addColumn<QString>("last");
+        QTest::addColumn<int>("count");
+        QTest::newRow("lines") << dbfiles::TempDocs << "tTempDocLines" << QStringList{"WizFileID", "HeadNumber", "LineNum"}
+                               << "WizFileID" << "Details" << 21;
+        QTest::newRow("headers") << dbfiles::TempDocs << "tTempDocHeaders" << QStringList{"WizFileID", "Number"}
+                                 << "WizFileID" << "OrigAccountKey" << 25;
+        QTest::newRow("label data") << dbfiles::TempDocs << "tPLabData" << QStringList{"KLine"} << "KLine" << "Par20" << 24;
+        QTest::newRow("items") << dbfiles::Items << "tItems" << QStringList{"ItemKey"} << "ItemKey" << "IgnoreInDoc" << 22;
+        QTest::newRow("price list") << dbfiles::Items << "tPriceList" << QStringList{"ItemKey", "PriceList"} << "ItemKey"
+                                    << "Currency" << 4;
+        QTest::newRow("staging items") << dbfiles::TempItems << "tTempItems" << QStringList{"ItemKey"} << "ItemKey"
+                                       << "IgnoreInDoc" << 22;
+    }
+    void keysAndLayout()
+    {
+        QFETCH(QString, file);
+        QFETCH(QString, table);
+        QFETCH(QStringList, key);
+        QFETCH(QString, first);
+        QFETCH(QString, last);
+        QFETCH(int, count);
+        Database db;
+        QVERIFY(!db.open(path(file)));
+        const QStringList cols = columnsOf(db, table);
+        QCOMPARE(cols.size(), count);
+        QCOMPARE(cols.first(), first);
+        QCOMPARE(cols.last(), last);
+        QCOMPARE(columnsOf(db, table, true), key);
+        const QString sql = db.scalar(QStringLiteral("SELECT sql FROM sqlite_master WHERE name='%1'").arg(table)).toString();
+        QVERIFY(sql.contains("CONSTRAINT PrimaryKey PRIMARY KEY"));
+    }
+
+    void accountDefCountsItsOwnIds()
+    {
+        Database db;
+        QVERIFY(!db.open(path(dbfiles::Items)));
+        QVERIFY(!db.exec("INSERT INTO tAccountDef (AccountKey) VALUES ('C1'); INSERT INTO tAccountDef (AccountKey) VALUES ('C2');"
+                         "DELETE FROM tAccountDef WHERE AccountKey='C2'; INSERT INTO tAccountDef (AccountKey) VALUES ('C3')"));
+        QCOMPARE(db.scalar("SELECT DefID FROM tAccountDef WHERE AccountKey='C3'").toInt(), 3);
+        QVERIFY(!db.exec("DELETE FROM tAccountDef"));
+    }
+
+    // What the item import's merge does to the main tables.
+    void merges_data()
+    {
+        QTest::addColumn<QString>("main");
+        QTest::addColumn<QString>("staged");
+        QTest::addColumn<QString>("query");
+        QTest::addColumn<QString>("check");
+        QTest::addColumn<QString>("expected");
+        QTest::newRow("alternate barcode kept, number updated")
+            << "INSERT INTO tAlterKeys VALUES ('C1', 'I1', 'old', 'BAR-7')"
+            << "INSERT INTO tTempAlterKeys VALUES ('C1', 'I1', 'new', 'ignored')" << "qAddUpdateAlterKeys"
+            << "SELECT AlterNum || '/' || AlterBar FROM tAlterKeys WHERE AccountKey='C1'" << "new/BAR-7";
+        QTest::newRow("new alternate has no barcode")
+            << "" << "INSERT INTO tTempAlterKeys VALUES ('C''2', 'I1', 'n2', 'B2')" << "qAddUpdateAlterKeys"
+            << "SELECT AlterNum || '/' || coalesce(AlterBar, 'none') FROM tAlterKeys WHERE AccountKey='C''2'" << "n2/none";
+        QTest::newRow("absent main row stays")
+            << "INSERT INTO tAlterPrices VALUES ('C9', 'I9', 5, 'EUR')"
+            << "INSERT INTO tTempAlterPrices VALUES ('C1', 'I1', 7, '$')" << "qAddUpdateAlterPrices"
+            << "SELECT group_concat(AccountKey || '=' || Price, ';') FROM (SELECT * FROM tAlterPrices ORDER BY AccountKey)"
+            << "C1=7.0;C9=5.0";
+        QTest::newRow("special price updated")
+            << "INSERT INTO tAlterPrices VALUES ('C1', 'I1', 5, 'EUR')"
+            << "INSERT INTO tTempAlterPrices VALUES ('C1', 'I1', 6.5, '$')" << "qAddUpdateAlterPrices"
+            << "SELECT Price || Coin FROM tAlterPrices" << "6.5$";
+        QTest::newRow("price list 0 is not merged")
+            << "INSERT INTO tPriceList VALUES ('I1', 1, 10, 'ILS')"
+            << "INSERT INTO tTempPriceList VALUES ('I1', 0, 99, 'ILS'); INSERT INTO tTempPriceList VALUES ('I1', 1, 11, 'ILS');"
+               "INSERT INTO tTempPriceList VALUES ('I2', 3, 30, 'USD')"
+            << "qAddUpdatePriceList"
+            << "SELECT group_concat(ItemKey || ':' || PriceList || '=' || Price, ';') FROM (SELECT * FROM tPriceList ORDER BY 1, 2)"
+            << "I1:1=11.0;I2:3=30.0";
+    }
+    void merges()
+    {
+        QFETCH(QString, main);
+        QFETCH(QString, staged);
+        QFETCH(QString, query);
+        QFETCH(QString, check);
+        QFETCH(QString, expected);
+        const QString items = path("merge-items.tdb");
+        const QString staging = path("merge-staging.tmp");
+        DbError e;
+        QVERIFY(!CreateItemsDB(items, &e).isEmpty());
+        QVERIFY(!CreateTempItemsDB(staging, items, &e).isEmpty());
+        Database db;
+        QVERIFY(!db.open(staging));
+        if (!main.isEmpty())
+            QVERIFY(!db.exec(main));
+        QVERIFY(!db.exec(staged));
+        QVERIFY2(!(e = db.runQuery(query)), qPrintable(e.message));
+        // Running it again changes nothing more.
+        QVERIFY(!db.runQuery(query));
+        QCOMPARE(db.scalar(check).toString(), expected);
+    }
+
+    void missingLinkSourceStopsAtThatLink()
+    {
+        const QString config = path("partial-config.tdb");
+        {
+            Database c;
+            QVERIFY(!c.open(config, Database::OpenMode::Create));
+            // No tCurrencies: the third link fails.
+            QVERIFY(!c.exec("CREATE TABLE tDocTypes (DocType); CREATE TABLE tCSTable (a); CREATE TABLE tWizFiles (a);"
+                            "CREATE TABLE tWizFileRanges (a)"));
+        }
+        const QString target = path("partial.tmp");
+        DbError e;
+        QVERIFY(CreateTempDocsDB(config, path(dbfiles::Items), target, &e).isEmpty());
+        QCOMPARE(e.kind, DbError::Kind::NotFound);
+        QVERIFY(e.message.contains("tCurrencies"));
+        Database db;
+        QVERIFY(!db.open(target));
+        QCOMPARE(linkNames(db), QStringList({"tDocTypes", "tCSTable"}));
+        QCOMPARE(db.tableNames().size(), 7);
+    }
+
+    void upgrade()
+    {
+        const QString items = path("upgrade.tdb");
+        DbError e;
+        QVERIFY(!CreateItemsDB(items, &e).isEmpty());
+        QCOMPARE(UpgradeAccountDef(items, &e), items);
+        QVERIFY(!e);
+        QVERIFY(UpgradeAccountDef(items, &e).isEmpty());
+        QVERIFY(e.message.contains("FldID"));
+        Database db;
+        QVERIFY(!db.open(items));
+        QCOMPARE(columnsOf(db, "tAccountDef").size(), 8);
+        db.close();
+        QVERIFY(UpgradeAccountDef(path("none.tdb"), &e).isEmpty());
+        QCOMPARE(e.kind, DbError::Kind::NotFound);
+        QCOMPARE(e.message, QString::fromUtf8("בסיס הנתונים אינו נמצא"));
+    }
+
+    // The documents database reaches the recipes and the items through one open file.
+    void documentsDatabaseJoinsThroughLinks()
+    {
+        DbError e;
+        const QString docs = CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), path(dbfiles::TempDocs), &e);
+        QVERIFY(!docs.isEmpty());
+        Database db;
+        QVERIFY(!db.open(docs));
+        QCOMPARE(db.scalar("SELECT count(*) FROM qDocTypes WHERE Include Or IncludeDraft").toInt(), 2);
+        QCOMPARE(db.scalar("SELECT HeadTable FROM qDocTypes WHERE DocType = 1").toString(), QString("ORDERS"));
+        QVERIFY(!db.exec("INSERT INTO tItems (ItemKey, ItemName) VALUES ('I1', 'Bolt');"
+                         "INSERT INTO tTempDocHeaders (WizFileID, Number, DocType, DocDate, Include) VALUES (2, 7, 1, '2024-03-05', TRUE);"
+                         "INSERT INTO tTempDocLines (WizFileID, HeadNumber, LineNum, ItemKey, Include) VALUES (2, 7, 1, 'I1', TRUE)"));
+        Statement h = db.prepare("SELECT * FROM qSelectDocHeaders");
+        QCOMPARE(h.step(), Statement::Step::Row);
+        QCOMPARE(h.value("MyDocDesc").toString(), QString::fromUtf8("הזמנות לקוח"));
+        QCOMPARE(h.value(2).toString(), QString("05/03/24"));
+        QCOMPARE(db.scalar("SELECT ItemName FROM qSelectDocLines").toString(), QString("Bolt"));
+        QVERIFY(!db.exec("DELETE FROM tItems"));
+    }
+};
+
+QTEST_GUILESS_MAIN(TestSchema)
+#include "tst_schema.moc"
