@@ -1,20 +1,30 @@
 #!/usr/bin/env bash
-# The main job: builds, then shows the control in a window when a display is
-# available; otherwise runs it headless, pictures each of its ten tabs into
-# build/screens/ and prints what it did.
+# The main job: builds, makes the demo company (an ERP database registered as
+# the ODBC data source "TagoraDemo", with the control's settings pointing at it
+# and at a data folder beside it), then shows the control in a window when a
+# display is available. Without one it runs the control headless: imports the
+# demo company's items with a price list, part numbers, special prices and all
+# price lists, saves a picture of each tab to build/screens/ and says what it did.
 set -euo pipefail
 ROOT="$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)"
 BUILD_DIR="${BUILD_DIR:-$ROOT/build}"
+DEMO_DIR="${TAGORA_DEMO_DIR:-$BUILD_DIR/demo}"
+SETTINGS="$DEMO_DIR/tagora.ini"
 "$ROOT/scripts/build.sh"
 
+mkdir -p "$DEMO_DIR"
+"$BUILD_DIR/app/tagora-cli" --settings "$SETTINGS" --demo "$DEMO_DIR" 2>/dev/null | head -n 1
+
 if [[ -n "${DISPLAY:-}${WAYLAND_DISPLAY:-}" ]]; then
-  exec "$BUILD_DIR/app/tagora" "$@"
+  exec "$BUILD_DIR/app/tagora" --settings "$SETTINGS" "$@"
 fi
 
 mkdir -p "$BUILD_DIR/screens"
-args=()
+args=(set cmbPriceField 1 set ChkImportAlterKeys 1 set ChkImportAltKeySup 1 set ChkImportAlterPrices 1
+      set chkReadPriceList 1 set chkReadItemParam 1 click cmdSaveDef2 click CmdImportItems)
 for tab in 0 1 2 3 4 5 6 7 8 9; do
   args+=(set MainTab "$tab" grab "$BUILD_DIR/screens/tab$tab.png")
 done
-"$BUILD_DIR/app/tagora-cli" "$@" "${args[@]}" get txtDBPath call GetOLEOption
+"$BUILD_DIR/app/tagora-cli" --settings "$SETTINGS" "$@" "${args[@]}"
+echo "items imported into $DEMO_DIR/data/tgrmitm.tdb: $(sqlite3 "$DEMO_DIR/data/tgrmitm.tdb" 'SELECT count(*) FROM tItems')"
 echo "screens of the ten tabs: $BUILD_DIR/screens/"

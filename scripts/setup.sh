@@ -7,6 +7,7 @@ PACKAGES=(
   build-essential cmake ninja-build pkg-config
   qt6-base-dev qt6-base-dev-tools libgl-dev
   libsqlite3-dev sqlite3
+  unixodbc unixodbc-dev libsqliteodbc odbc-postgresql postgresql
   fonts-dejavu-core
 )
 

@@ -1,8 +1,11 @@
 // The headless host: creates the control without a screen, runs its creation
 // and show steps, then a sequence of verbs in that one instance:
-//   set NAME VALUE | get NAME | click NAME | call METHOD [ARG...]
+//   set NAME VALUE | get NAME | click NAME | dblclick NAME | call METHOD [ARG...]
 //   additem NAME TEXT | grab FILE
-// Options: --settings FILE, --answer yes|no, --file PATH, --script FILE|-
+// Options: --settings FILE, --answer yes|no, --file PATH, --script FILE|-,
+//   --demo DIR (with --demo-items N, --demo-type 1|2 before it).
+// A dialog that a command opens takes the verbs that follow until one of them
+// closes it; verbs name the dialog's controls first, then the control's.
 #include "control/automation.h"
 #include "control/commondialog.h"
 #include "control/controlbinding.h"
@@ -10,9 +13,11 @@
 #include "control/prompt.h"
 #include "control/settingsstore.h"
 #include "control/settingstable.h"
+#include "erp/demosetup.h"
 
 #include <QApplication>
 #include <QComboBox>
+#include <QDialog>
 #include <QFile>
 #include <QTextStream>
 #include <cstdio>
@@ -22,7 +27,7 @@ namespace {
 
 using namespace tagora;
 
-const QStringList kVerbs = {"set", "get", "click", "call", "additem", "grab"};
+const QStringList kVerbs = {"set", "get", "click", "dblclick", "call", "additem", "grab"};
 
 void out(const QString& text)
 {
@@ -38,6 +43,14 @@ void err(const QString& text)
     std::fwrite(b.constData(), 1, size_t(b.size()), stderr);
     std::fputc('\n', stderr);
     std::fflush(stderr);
+}
+
+// Qt's own chatter (no runtime folder, no window system) would mix with the
+// message-box lines on standard error; keep only real failures unless asked.
+void quietHandler(QtMsgType type, const QMessageLogContext&, const QString& msg)
+{
+    if (type == QtCriticalMsg || type == QtFatalMsg || qEnvironmentVariableIsSet("TAGORA_DEBUG"))
+        err(msg);
 }
 
 // Splits a script line like a shell would: quotes group, a backslash escapes.
@@ -96,60 +109,285 @@ bool readScript(const QString& path, QStringList* tokens)
     return true;
 }
 
-struct Target {
-    QObject* control = nullptr;
-    std::optional<BindKind> kind;
-    QString property;
-};
-
-// "NAME" or "NAME.Property"; without a property, the kind the settings store
-// uses for that control, else the control's natural one.
-Target resolve(MainCard* card, const QString& address, QString* error)
-{
-    Target t;
-    QString name = address;
-    const int dot = address.lastIndexOf(QLatin1Char('.'));
-    if (dot > 0 && !address.mid(dot + 1).contains(QLatin1Char(')'))) {
-        name = address.left(dot);
-        t.property = address.mid(dot + 1);
+class Interpreter : public DialogRunner {
+public:
+    explicit Interpreter(QStringList tokens)
+        : m_tokens(std::move(tokens))
+    {
     }
-    t.control = card->control(name);
-    if (!t.control) {
-        *error = QStringLiteral("no control named '%1'").arg(name);
+
+    int exec()
+    {
+        while (m_pos < m_tokens.size() && !m_failed)
+            step();
+        if (!m_failed)
+            ensureCard();
+        if (m_failed)
+            return 2;
+        return m_prompt->criticalCount() > 0 ? 1 : 0;
+    }
+
+    // A dialog opened by a command takes the verbs that follow until closed.
+    int run(QDialog& dialog) override
+    {
+        dialog.show();
+        m_scopes.push_back(&dialog);
+        while (dialog.isVisible() && m_pos < m_tokens.size() && !m_failed)
+            step();
+        if (dialog.isVisible())
+            dialog.reject();
+        m_scopes.pop_back();
+        return dialog.result();
+    }
+
+private:
+    bool has(int count) const { return m_pos + count <= m_tokens.size(); }
+    QString take() { return m_tokens[m_pos++]; }
+
+    void usage(const QString& why = QString())
+    {
+        if (!why.isEmpty())
+            err(why);
+        err(QStringLiteral("usage: tagora-cli [--settings FILE] [--answer yes|no] [--file PATH] [--script FILE|-] "
+                           "[--demo-items N] [--demo-type 1|2] [--demo DIR] [set NAME VALUE | get NAME | click NAME | "
+                           "dblclick NAME | call METHOD [ARG...] | additem NAME TEXT | grab FILE]..."));
+        m_failed = true;
+    }
+
+    void fail(const QString& why)
+    {
+        err(why);
+        m_failed = true;
+    }
+
+    SettingsStore& store()
+    {
+        if (!m_store)
+            m_store = defaultSettingsStore();
+        return *m_store;
+    }
+
+    void ensureCard()
+    {
+        if (m_card)
+            return;
+        Services services;
+        services.settings = m_store ? m_store : defaultSettingsStore();
+        m_store = services.settings;
+        services.prompt = m_prompt;
+        services.fileDialog = m_files;
+        // The card lives as long as this interpreter, which outlives every use of it.
+        services.dialogs = std::shared_ptr<DialogRunner>(this, [](DialogRunner*) {});
+        m_card = std::make_unique<MainCard>(nullptr, services);
+        QObject::connect(m_card.get(), &MainCard::messageChanged, [](const QString& text) {
+            if (!text.isEmpty())
+                out(text);
+        });
+        m_card->resize(m_card->sizeHint().expandedTo(QSize(1280, 600)));
+        m_card->show();
+        // What the show step reports (an ERP that cannot be reached, say) is
+        // shown, but the exit status speaks of the commands that follow.
+        m_prompt->clear();
+    }
+
+    QObject* find(const QString& name) const
+    {
+        for (auto it = m_scopes.rbegin(); it != m_scopes.rend(); ++it)
+            if (QObject* o = findControl(*it, name))
+                return o;
+        return m_card ? m_card->control(name) : nullptr;
+    }
+
+    struct Target {
+        QObject* control = nullptr;
+        std::optional<BindKind> kind;
+        QString property;
+    };
+
+    // "NAME" or "NAME.Property"; without a property, the kind the settings
+    // store uses for that control, else the control's natural one.
+    Target resolve(const QString& address, QString* error) const
+    {
+        Target t;
+        QString name = address;
+        const int dot = address.lastIndexOf(QLatin1Char('.'));
+        if (dot > 0 && !address.mid(dot + 1).contains(QLatin1Char(')'))) {
+            name = address.left(dot);
+            t.property = address.mid(dot + 1);
+        }
+        t.control = find(name);
+        if (!t.control) {
+            *error = QStringLiteral("no control named '%1'").arg(name);
+            return t;
+        }
+        static const std::pair<const char*, BindKind> props[] = {
+            {"Text", BindKind::Text}, {"ListIndex", BindKind::ListIndex},
+            {"Value", BindKind::Value}, {"Caption", BindKind::Caption}};
+        if (t.property.isEmpty()) {
+            t.kind = addressKind(t.control);
+            return t;
+        }
+        for (const auto& [p, k] : props)
+            if (t.property == QLatin1String(p))
+                t.kind = k;
+        if (!t.kind && t.property != QLatin1String("Tag") && t.property != QLatin1String("ListCount")) {
+            *error = QStringLiteral("unknown property '%1'").arg(t.property);
+            t.control = nullptr;
+        }
         return t;
     }
-    if (t.property.isEmpty()) {
-        t.kind = addressKind(t.control);
-    } else if (t.property == QLatin1String("Text")) {
-        t.kind = BindKind::Text;
-    } else if (t.property == QLatin1String("ListIndex")) {
-        t.kind = BindKind::ListIndex;
-    } else if (t.property == QLatin1String("Value")) {
-        t.kind = BindKind::Value;
-    } else if (t.property == QLatin1String("Caption")) {
-        t.kind = BindKind::Caption;
-    } else if (t.property != QLatin1String("Tag") && t.property != QLatin1String("ListCount")) {
-        *error = QStringLiteral("unknown property '%1'").arg(t.property);
-        t.control = nullptr;
+
+    void step()
+    {
+        const QString t = take();
+        if (t == QLatin1String("--settings")) {
+            if (!has(1))
+                return usage();
+            if (m_card)
+                return fail(QStringLiteral("--settings must come before the first verb"));
+            m_store = std::make_shared<IniSettingsStore>(take());
+        } else if (t == QLatin1String("--answer")) {
+            if (!has(1))
+                return usage();
+            const QString a = take().toLower();
+            if (a != QLatin1String("yes") && a != QLatin1String("no"))
+                return usage(QStringLiteral("--answer takes yes or no"));
+            m_prompt->setDefaultAnswer(a == QLatin1String("yes"));
+        } else if (t == QLatin1String("--file")) {
+            if (!has(1))
+                return usage();
+            m_files->queue(take());
+        } else if (t == QLatin1String("--script")) {
+            if (!has(1))
+                return usage();
+            const QString path = take();
+            QStringList more;
+            if (!readScript(path, &more))
+                return fail(QStringLiteral("cannot read script %1").arg(path));
+            for (int k = 0; k < more.size(); ++k)
+                m_tokens.insert(m_pos + k, more[k]);
+        } else if (t == QLatin1String("--demo-items") || t == QLatin1String("--demo-type")) {
+            bool ok = false;
+            const int n = has(1) ? take().toInt(&ok) : 0;
+            if (!ok || n < 0 || (t == QLatin1String("--demo-type") && n != 1 && n != 2))
+                return usage(QStringLiteral("%1 takes a number").arg(t));
+            if (t == QLatin1String("--demo-items"))
+                m_demo.items = n;
+            else
+                m_demo.connType = short(n);
+        } else if (t == QLatin1String("--demo")) {
+            if (!has(1))
+                return usage();
+            if (m_card)
+                return fail(QStringLiteral("--demo must come before the first verb"));
+            const QString dir = take();
+            const QString e = SetupDemoCompany(dir, m_demo, store());
+            if (!e.isEmpty())
+                return fail(e);
+            out(QStringLiteral("demo company ready in %1 (data source %2)").arg(dir, kDemoDsn));
+        } else if (t == QLatin1String("--help") || t == QLatin1String("-h")) {
+            usage();
+            m_failed = false;
+            m_pos = int(m_tokens.size());
+        } else if (kVerbs.contains(t)) {
+            ensureCard();
+            verb(t);
+            QCoreApplication::processEvents();
+        } else {
+            usage(QStringLiteral("unknown verb '%1'").arg(t));
+        }
     }
-    return t;
-}
 
-int usage()
-{
-    err(QStringLiteral("usage: tagora-cli [--settings FILE] [--answer yes|no] [--file PATH] [--script FILE|-] "
-                       "[set NAME VALUE | get NAME | click NAME | call METHOD [ARG...] | additem NAME TEXT | "
-                       "grab FILE]..."));
-    return 2;
-}
+    void verb(const QString& t)
+    {
+        QString error;
+        if (t == QLatin1String("set")) {
+            if (!has(2))
+                return usage();
+            const QString name = take();
+            const QString value = take();
+            const Target target = resolve(name, &error);
+            if (!target.control || !target.kind)
+                return fail(error.isEmpty() ? QStringLiteral("%1 cannot be set").arg(name) : error);
+            if (!writeBound(target.control, *target.kind, value))
+                return fail(QStringLiteral("%1 refused the value '%2'").arg(name, value));
+        } else if (t == QLatin1String("get")) {
+            if (!has(1))
+                return usage();
+            const QString name = take();
+            const Target target = resolve(name, &error);
+            if (!target.control)
+                return fail(error);
+            if (target.property == QLatin1String("Tag")) {
+                out(target.control->property("Tag").toString());
+            } else if (target.property == QLatin1String("ListCount")) {
+                auto* combo = qobject_cast<QComboBox*>(target.control);
+                out(QString::number(combo ? combo->count() : 0));
+            } else {
+                const auto value = target.kind ? readBound(target.control, *target.kind) : std::nullopt;
+                if (!value)
+                    return fail(QStringLiteral("%1 has no such value").arg(name));
+                out(*value);
+            }
+        } else if (t == QLatin1String("click") || t == QLatin1String("dblclick")) {
+            if (!has(1))
+                return usage();
+            const QString name = take();
+            QObject* c = find(name);
+            if (!c)
+                return fail(QStringLiteral("no control named '%1'").arg(name));
+            const bool ok = t == QLatin1String("click")
+                ? clickControl(c)
+                : QMetaObject::invokeMethod(c, "doubleClicked", Qt::DirectConnection);
+            if (!ok)
+                return fail(QStringLiteral("%1 cannot be clicked").arg(name));
+        } else if (t == QLatin1String("call")) {
+            if (!has(1))
+                return usage();
+            const QString method = take();
+            const auto arity = methodArity(m_card.get(), method);
+            if (!arity)
+                return fail(QStringLiteral("no public method named '%1'").arg(method));
+            QStringList args;
+            // Required arguments are taken as they come; optional ones only up to the next verb.
+            while (args.size() < arity->second && has(1)
+                   && (args.size() < arity->first
+                       || (!kVerbs.contains(m_tokens[m_pos]) && !m_tokens[m_pos].startsWith(QLatin1String("--")))))
+                args << take();
+            const CallResult r = callMethod(m_card.get(), method, args);
+            if (!r.ok)
+                return fail(r.error);
+            if (r.hasValue)
+                out(variantText(r.value));
+        } else if (t == QLatin1String("additem")) {
+            if (!has(2))
+                return usage();
+            const QString name = take();
+            const QString text = take();
+            auto* combo = qobject_cast<QComboBox*>(find(name));
+            if (!combo)
+                return fail(QStringLiteral("%1 is not a list").arg(name));
+            combo->addItem(text);
+        } else if (t == QLatin1String("grab")) {
+            if (!has(1))
+                return usage();
+            const QString file = take();
+            QWidget* w = m_scopes.empty() ? static_cast<QWidget*>(m_card.get()) : m_scopes.back();
+            if (!w->grab().save(file))
+                return fail(QStringLiteral("cannot write %1").arg(file));
+        }
+    }
 
-// Qt's own chatter (no runtime folder, no window system) would mix with the
-// message-box lines on standard error; keep only real failures unless asked.
-void quietHandler(QtMsgType type, const QMessageLogContext&, const QString& msg)
-{
-    if (type == QtCriticalMsg || type == QtFatalMsg || qEnvironmentVariableIsSet("TAGORA_DEBUG"))
-        err(msg);
-}
+    QStringList m_tokens;
+    int m_pos = 0;
+    bool m_failed = false;
+    std::shared_ptr<ScriptedPrompt> m_prompt = std::make_shared<ScriptedPrompt>(stderr);
+    std::shared_ptr<ScriptedFileDialog> m_files = std::make_shared<ScriptedFileDialog>();
+    std::shared_ptr<SettingsStore> m_store;
+    DemoOptions m_demo;
+    std::unique_ptr<MainCard> m_card;
+    std::vector<QWidget*> m_scopes;
+};
 
 } // namespace
 
@@ -162,173 +400,6 @@ int main(int argc, char** argv)
     QApplication app(argc, argv);
     QApplication::setApplicationName(QStringLiteral("Tagora"));
     QApplication::setLayoutDirection(Qt::RightToLeft);
-
-    QStringList tokens = app.arguments().mid(1);
-    auto prompt = std::make_shared<ScriptedPrompt>(stderr);
-    auto files = std::make_shared<ScriptedFileDialog>();
-    std::shared_ptr<SettingsStore> store;
-    std::unique_ptr<MainCard> card;
-
-    auto needArg = [&](int i, int count) { return i + count < tokens.size(); };
-    auto ensureCard = [&] {
-        if (card)
-            return;
-        Services services;
-        services.settings = store ? store : defaultSettingsStore();
-        services.prompt = prompt;
-        services.fileDialog = files;
-        card = std::make_unique<MainCard>(nullptr, services);
-        QObject::connect(card.get(), &MainCard::messageChanged, [](const QString& text) {
-            if (!text.isEmpty())
-                out(text);
-        });
-        card->resize(card->sizeHint().expandedTo(QSize(1280, 600)));
-        card->show();
-    };
-
-    for (int i = 0; i < tokens.size(); ++i) {
-        const QString t = tokens[i];
-        if (t == QLatin1String("--help") || t == QLatin1String("-h"))
-        {
-            usage();
-            return 0;
-        }
-        if (t == QLatin1String("--settings")) {
-            if (!needArg(i, 1))
-                return usage();
-            if (card) {
-                err(QStringLiteral("--settings must come before the first verb"));
-                return 2;
-            }
-            store = std::make_shared<IniSettingsStore>(tokens[++i]);
-            continue;
-        }
-        if (t == QLatin1String("--answer")) {
-            if (!needArg(i, 1))
-                return usage();
-            const QString a = tokens[++i].toLower();
-            if (a != QLatin1String("yes") && a != QLatin1String("no"))
-                return usage();
-            prompt->setDefaultAnswer(a == QLatin1String("yes"));
-            continue;
-        }
-        if (t == QLatin1String("--file")) {
-            if (!needArg(i, 1))
-                return usage();
-            files->queue(tokens[++i]);
-            continue;
-        }
-        if (t == QLatin1String("--script")) {
-            if (!needArg(i, 1))
-                return usage();
-            QStringList more;
-            if (!readScript(tokens[++i], &more)) {
-                err(QStringLiteral("cannot read script %1").arg(tokens[i]));
-                return 2;
-            }
-            for (int k = 0; k < more.size(); ++k)
-                tokens.insert(i + 1 + k, more[k]);
-            continue;
-        }
-        if (!kVerbs.contains(t)) {
-            err(QStringLiteral("unknown verb '%1'").arg(t));
-            return usage();
-        }
-
-        ensureCard();
-
-        QString error;
-        if (t == QLatin1String("set")) {
-            if (!needArg(i, 2))
-                return usage();
-            const Target target = resolve(card.get(), tokens[i + 1], &error);
-            const QString value = tokens[i + 2];
-            i += 2;
-            if (!target.control || !target.kind) {
-                err(error.isEmpty() ? QStringLiteral("%1 cannot be set").arg(tokens[i - 1]) : error);
-                return 2;
-            }
-            if (!writeBound(target.control, *target.kind, value)) {
-                err(QStringLiteral("%1 refused the value '%2'").arg(tokens[i - 1], value));
-                return 2;
-            }
-        } else if (t == QLatin1String("get")) {
-            if (!needArg(i, 1))
-                return usage();
-            const Target target = resolve(card.get(), tokens[++i], &error);
-            if (!target.control) {
-                err(error);
-                return 2;
-            }
-            if (target.property == QLatin1String("Tag")) {
-                out(target.control->property("Tag").toString());
-            } else if (target.property == QLatin1String("ListCount")) {
-                auto* combo = qobject_cast<QComboBox*>(target.control);
-                out(QString::number(combo ? combo->count() : 0));
-            } else {
-                const auto value = target.kind ? readBound(target.control, *target.kind) : std::nullopt;
-                if (!value) {
-                    err(QStringLiteral("%1 has no such value").arg(tokens[i]));
-                    return 2;
-                }
-                out(*value);
-            }
-        } else if (t == QLatin1String("click")) {
-            if (!needArg(i, 1))
-                return usage();
-            QObject* c = card->control(tokens[++i]);
-            if (!c) {
-                err(QStringLiteral("no control named '%1'").arg(tokens[i]));
-                return 2;
-            }
-            if (!clickControl(c)) {
-                err(QStringLiteral("%1 cannot be clicked").arg(tokens[i]));
-                return 2;
-            }
-        } else if (t == QLatin1String("call")) {
-            if (!needArg(i, 1))
-                return usage();
-            const QString method = tokens[++i];
-            const auto arity = methodArity(card.get(), method);
-            if (!arity) {
-                err(QStringLiteral("no public method named '%1'").arg(method));
-                return 2;
-            }
-            QStringList args;
-            // Required arguments are taken as they come; optional ones only up to the next verb.
-            while (args.size() < arity->second && i + 1 < tokens.size()
-                   && (args.size() < arity->first || (!kVerbs.contains(tokens[i + 1]) && !tokens[i + 1].startsWith(QLatin1String("--")))))
-                args << tokens[++i];
-            const CallResult r = callMethod(card.get(), method, args);
-            if (!r.ok) {
-                err(r.error);
-                return 2;
-            }
-            if (r.hasValue)
-                out(variantText(r.value));
-        } else if (t == QLatin1String("additem")) {
-            if (!needArg(i, 2))
-                return usage();
-            auto* combo = qobject_cast<QComboBox*>(card->control(tokens[i + 1]));
-            if (!combo) {
-                err(QStringLiteral("%1 is not a list").arg(tokens[i + 1]));
-                return 2;
-            }
-            combo->addItem(tokens[i + 2]);
-            i += 2;
-        } else if (t == QLatin1String("grab")) {
-            if (!needArg(i, 1))
-                return usage();
-            const QString file = tokens[++i];
-            if (!card->grab().save(file)) {
-                err(QStringLiteral("cannot write %1").arg(file));
-                return 2;
-            }
-        }
-        QCoreApplication::processEvents();
-    }
-
-    // Even without verbs the control is created and shown, so a host check sees it start.
-    ensureCard();
-    return prompt->criticalCount() > 0 ? 1 : 0;
+    Interpreter interpreter(app.arguments().mid(1));
+    return interpreter.exec();
 }

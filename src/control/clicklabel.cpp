@@ -27,3 +27,14 @@ void ClickLabel::mouseReleaseEvent(QMouseEvent* event)
 }
 
 } // namespace tagora
+
+namespace tagora {
+
+void ClickLabel::mouseDoubleClickEvent(QMouseEvent* event)
+{
+    QLabel::mouseDoubleClickEvent(event);
+    if (event->button() == Qt::LeftButton)
+        emit doubleClicked();
+}
+
+} // namespace tagora

@@ -71,6 +71,8 @@ MainCard::MainCard(QWidget* parent, Services services)
         m_services.fileDialog = std::make_shared<WidgetFileDialog>(this);
     if (!m_services.printers)
         m_services.printers = systemPrinterCatalog();
+    if (!m_services.dialogs)
+        m_services.dialogs = std::make_shared<DialogRunner>();
 
     ui->setupUi(this);
     setLayoutDirection(Qt::RightToLeft);
@@ -593,13 +595,6 @@ void MainCard::cmdLabDesign_Click()
     m_shared.dataFolder = ui->txtDBPath->text();
     m_shared.objectRef = this;
     showDialog(QStringLiteral("frmLabDef"));
-}
-
-void MainCard::CmdConnect_Click()
-{
-    m_shared.dataFolder = ui->txtDBPath->text();
-    showDialog(QStringLiteral("frmLogon"));
-    UserControl_InitProperties();
 }
 
 void MainCard::CmdImportItems_Click()

@@ -12,6 +12,7 @@
 class QLabel;
 class QFrame;
 class QTabWidget;
+class QDialog;
 
 namespace Ui {
 class MainCardForm;
@@ -20,6 +21,7 @@ class MainCardForm;
 namespace tagora {
 
 class CommonDialog;
+struct ReadError;
 
 // What the control hands to a dialog before it opens it.
 struct SharedDialogState {
@@ -173,12 +175,18 @@ private:
     void ImportDocuments();
     void PrintFromLabelList();
     void showDialog(const QString& formName);
+    int runDialog(QDialog& dialog);
+    bool reportRead(bool ok, const ReadError& error);
+    short priceListNumber() const;
 
     std::unique_ptr<Ui::MainCardForm> ui;
     Services m_services;
     CommonDialog* m_fileDialog = nullptr;
     SharedDialogState m_shared;
     double m_progress = 0.0;
+    // Set by each document import for the item readers that run by documents.
+    QString m_currentDocCriteria;
+    QString m_currentItemByDocCriteria;
 };
 
 } // namespace tagora

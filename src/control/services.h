@@ -2,12 +2,23 @@
 
 #include <memory>
 
+class QDialog;
+
 namespace tagora {
 
 class SettingsStore;
 class Prompt;
 class FileDialogProvider;
 class PrinterCatalog;
+class DialogRunner;
+
+// How a modal dialog is shown: on a screen it runs its own event loop; the
+// headless host and the tests drive it from their script instead.
+class DialogRunner {
+public:
+    virtual ~DialogRunner() = default;
+    virtual int run(QDialog& dialog);
+};
 
 // What the control needs from its host's platform. A host leaves a member
 // empty to get the default: the per-user store, message boxes, file dialogs
@@ -17,6 +28,7 @@ struct Services {
     std::shared_ptr<Prompt> prompt;
     std::shared_ptr<FileDialogProvider> fileDialog;
     std::shared_ptr<PrinterCatalog> printers;
+    std::shared_ptr<DialogRunner> dialogs;
 };
 
 } // namespace tagora

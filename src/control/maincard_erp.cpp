@@ -1,0 +1,299 @@
+// The control's side of the ERP: the connection, the price lists offered,
+// and the item import with its public readers.
+#include "control/maincard.h"
+
+#include "control/prompt.h"
+#include "control/settingsstore.h"
+#include "dialogs/frmlogon.h"
+#include "erp/connparams.h"
+#include "erp/itemimport.h"
+#include "erp/odbc.h"
+#include "localdb/schema.h"
+
+#include "ui_maincard.h"
+
+#include <QFileInfo>
+
+#include <cmath>
+
+namespace tagora {
+
+namespace {
+constexpr int kTestTimeout = 10;
+
+short fromBool(bool ok)
+{
+    return ok ? -1 : 0;
+}
+
+QString text(const QVariant& v)
+{
+    return v.isValid() && !v.isNull() ? v.toString() : QString();
+}
+} // namespace
+
+void MainCard::LoadConnParams()
+{
+    tagora::LoadConnParams(*m_services.settings);
+}
+
+bool MainCard::TestConnection()
+{
+    const QString conn = currentConnString();
+    ErpConnection erp;
+    QString error;
+    if (conn.isEmpty())
+        error = QStringLiteral("סוג ההתחברות אינו מוגדר");
+    else if (erp.open(conn, kTestTimeout, &error))
+        return true;
+    m_services.prompt->critical(titles::Fault, error);
+    return false;
+}
+
+void MainCard::FillCmbPriceField()
+{
+    QComboBox* list = ui->cmbPriceField;
+    list->clear();
+    QString error;
+    for (const PriceField& f : ReadPriceFields(currentConnString(), &error))
+        list->addItem(f.text, f.priceList);
+}
+
+short MainCard::priceListNumber() const
+{
+    const int i = ui->cmbPriceField->currentIndex();
+    return i < 0 ? 0 : short(ui->cmbPriceField->itemData(i).toInt());
+}
+
+int MainCard::runDialog(QDialog& dialog)
+{
+    return m_services.dialogs->run(dialog);
+}
+
+bool MainCard::reportRead(bool ok, const ReadError& error)
+{
+    if (!ok)
+        m_services.prompt->critical(error.title, error.message);
+    return ok;
+}
+
+// ------------------------------------------------------------ public readers
+
+short MainCard::ReadItemPriority(const QString& CompPath, const QString& pDBPath, const QVariant& pFromItemSort,
+                                 const QVariant& pToItemSort, short GetForeign, short pCopies, int pPriceField,
+                                 bool /*pImportPackUnits*/, bool pByDocs, bool pWithWhouseData)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(reportRead(tagora::ReadItemPriority(ctx, pDBPath, text(pFromItemSort), text(pToItemSort),
+                                                         GetForeign != 0, pCopies, pPriceField, pByDocs,
+                                                         pWithWhouseData, &e),
+                               e));
+}
+
+short MainCard::ReadItemFName(const QString& CompPath, const QString& pDBPath, const QVariant& pFromItemSort,
+                              const QVariant& pToItemSort, bool pByDocs)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(
+        reportRead(tagora::ReadItemFName(ctx, pDBPath, text(pFromItemSort), text(pToItemSort), pByDocs, &e), e));
+}
+
+short MainCard::ReadAlterKeyPRIORITY(const QString& CompPath, const QString& pDBFullName, const QVariant&,
+                                     const QVariant&, bool pByDocs, const QString& pTableName)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(reportRead(tagora::ReadAlterKeyPRIORITY(ctx, pDBFullName, pByDocs, pTableName, &e), e));
+}
+
+short MainCard::ReadAlterKeySupPRIORITY(const QString& CompPath, const QString& pDBFullName, const QVariant&,
+                                        const QVariant&, bool pByDocs, const QString& pTableName)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(reportRead(tagora::ReadAlterKeySupPRIORITY(ctx, pDBFullName, pByDocs, pTableName, &e), e));
+}
+
+short MainCard::ReadAlterPricePRIORITY(const QString& CompPath, const QString& pDBFullName, const QVariant&,
+                                       const QVariant&, bool pByDocs, const QString& pTableName)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(reportRead(tagora::ReadAlterPricePRIORITY(ctx, pDBFullName, pByDocs, pTableName, &e), e));
+}
+
+short MainCard::ReadPriceListPriority(const QString& CompPath, const QString& pDBFullName,
+                                      const QVariant& pFromItemSort, const QVariant& pToItemSort, bool pByDocs,
+                                      const QString& pTableName)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(reportRead(tagora::ReadPriceListPriority(ctx, pDBFullName, text(pFromItemSort),
+                                                              text(pToItemSort), pByDocs, pTableName, &e),
+                               e));
+}
+
+short MainCard::ReadPriceListNamePriority(const QString& CompPath, const QString& pDBPath)
+{
+    ReadError e;
+    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    return fromBool(reportRead(tagora::ReadPriceListNamePriority(ctx, pDBPath, &e), e));
+}
+
+void MainCard::UpdateMainItemTables(const QString& pTempItemDB)
+{
+    QString error;
+    if (!tagora::UpdateMainItemTables(pTempItemDB, &error))
+        m_services.prompt->critical(titles::Error, error);
+}
+
+QString MainCard::BuildItemByDocCriteria(const QString& HeadTable, const QString& LineTable, const QString& FldID)
+{
+    return QStringLiteral(" And PART.PART In (SELECT DISTINCT ") + LineTable + QStringLiteral(".PART FROM ")
+        + HeadTable + QStringLiteral(", ") + LineTable + QStringLiteral(" WHERE ") + LineTable + QLatin1Char('.')
+        + FldID + QStringLiteral(" = ") + HeadTable + QLatin1Char('.') + FldID + m_currentDocCriteria
+        + QLatin1Char(')');
+}
+
+short MainCard::ImportItemsByDocs(const QString& WizPath, const QString& MyDBName, const QVariant& pFromItemKey,
+                                  const QVariant& pToItemKey, short UseFName, short pCopies, int pPriceField,
+                                  bool pImportPackUnits, bool)
+{
+    setMessage(QStringLiteral("קורא פריטים..."));
+    if (!ReadItemPriority(WizPath, MyDBName, pFromItemKey, pToItemKey, UseFName, pCopies, pPriceField,
+                          pImportPackUnits, true, ui->chkReadItemParam->isChecked()))
+        return 0;
+    setMessage(QStringLiteral("קורא שמות לועזיים..."));
+    if (!ReadItemFName(WizPath, MyDBName, pFromItemKey, pToItemKey, true))
+        return 0;
+    if (ui->ChkImportAlterKeys->isChecked()) {
+        setMessage(QStringLiteral("קורא מפתחות חליפיים..."));
+        if (!ReadAlterKeyPRIORITY(WizPath, MyDBName, pFromItemKey, pToItemKey, true, QStringLiteral("tTempAlterKeys")))
+            return 0;
+    }
+    if (ui->ChkImportAlterPrices->isChecked()) {
+        setMessage(QStringLiteral("קורא מחירים מיוחדים..."));
+        if (!ReadAlterPricePRIORITY(WizPath, MyDBName, pFromItemKey, pToItemKey, true,
+                                    QStringLiteral("tTempAlterPrices")))
+            return 0;
+    }
+    if (ui->chkReadPriceList->isChecked()) {
+        setMessage(QStringLiteral("קורא את המחירונים הנדרשים..."));
+        return ReadPriceListPriority(WizPath, MyDBName, pFromItemKey, pToItemKey, true, QStringLiteral("tTempPriceList"));
+    }
+    return -1;
+}
+
+// ------------------------------------------------------------ the commands
+
+void MainCard::CmdConnect_Click()
+{
+    m_shared.dataFolder = ui->txtDBPath->text();
+    FrmLogon dialog(m_services, this);
+    runDialog(dialog);
+    UserControl_InitProperties();
+}
+
+void MainCard::ImportItems()
+{
+    if (ui->ChkCleanAlterKeys->isChecked()
+        && !m_services.prompt->ask(PromptIcon::Question, titles::Attention,
+                                   QStringLiteral("אתה בטוח שברצונך לדרוס את המפתחות והברקודים החליפיים?")))
+        return;
+
+    auto fail = [this](const QString& message) { m_services.prompt->critical(titles::Error, message); };
+    const QString conn = currentConnString();
+    const int priceList = priceListNumber();
+    bool copiesOk = false;
+    const double copiesValue = ui->txtCopies->text().trimmed().toDouble(&copiesOk);
+    if (!copiesOk || copiesValue < -32768 || copiesValue > 32767)
+        return fail(QStringLiteral("ברירת המחדל לעותקים אינה מספר: '%1'").arg(ui->txtCopies->text()));
+    const short copies = short(std::nearbyint(copiesValue));
+
+    const QString folder = ui->txtDBPath->text();
+    const QString itemsDb = dataFile(dbfiles::Items);
+    const QString tempItemsDb = dataFile(dbfiles::TempItems);
+    const QString tempDocsDb = dataFile(dbfiles::TempDocs);
+    const bool cleanItems = ui->ChkClean->isChecked();
+    const bool cleanAlter = ui->ChkCleanAlterKeys->isChecked();
+
+    DbError e;
+    if (cleanItems && cleanAlter && QFileInfo::exists(itemsDb)) {
+        if (CreateItemsDB(itemsDb, &e).isEmpty() || UpgradeAccountDef(itemsDb, &e).isEmpty())
+            return fail(e.message);
+    }
+    if ((e = PrepareDataFolder(folder)))
+        return fail(e.message);
+    if (CreateTempItemsDB(tempItemsDb, itemsDb, &e).isEmpty())
+        return fail(e.message);
+    const short foreign = ui->CmbItemNameType->currentIndex() == 1 ? -1 : 0;
+
+    {
+        Database items;
+        if ((e = items.open(itemsDb)))
+            return fail(e.message);
+        if (cleanItems) {
+            setMessage(QStringLiteral("מנקה פריטים..."));
+            if ((e = items.exec(QStringLiteral("DELETE FROM tItems"))))
+                return fail(e.message);
+            if (ui->ChkImportAlterPrices->isChecked() && (e = items.exec(QStringLiteral("DELETE FROM tAlterPrices"))))
+                return fail(e.message);
+        }
+        if (cleanAlter) {
+            setMessage(QStringLiteral("מנקה מקטים חליפיים..."));
+            if ((e = items.exec(QStringLiteral("DELETE FROM tAlterKeys"))))
+                return fail(e.message);
+        }
+    }
+
+    const QString fromSort = ui->txtFromItemSort->text();
+    const QString toSort = ui->txtToItemSort->text();
+    setMessage(QStringLiteral("קורא פריטים..."));
+    if (!ReadItemPriority(conn, itemsDb, fromSort, toSort, foreign, copies, priceList, true, false,
+                          ui->chkReadItemParam->isChecked()))
+        return;
+    setMessage(QStringLiteral("קורא שמות לועזיים..."));
+    if (!ReadItemFName(conn, itemsDb, fromSort, toSort, false))
+        return;
+    const QString tempAlterKeys = QStringLiteral("tTempAlterKeys");
+    if (ui->ChkImportAlterKeys->isChecked()) {
+        setMessage(QStringLiteral("קורא מפתחות חליפיים לקוחות..."));
+        if (!ReadAlterKeyPRIORITY(conn, tempItemsDb, fromSort, toSort, false, tempAlterKeys))
+            return;
+    }
+    if (ui->ChkImportAltKeySup->isChecked()) {
+        setMessage(QStringLiteral("קורא מפתחות חליפיים ספקים..."));
+        if (!ReadAlterKeySupPRIORITY(conn, tempItemsDb, fromSort, toSort, false, tempAlterKeys))
+            return;
+    }
+    if (ui->ChkImportAlterPrices->isChecked()) {
+        setMessage(QStringLiteral("קורא מחירים מיוחדים..."));
+        if (!ReadAlterPricePRIORITY(conn, tempItemsDb, fromSort, toSort, false, QStringLiteral("tTempAlterPrices")))
+            return;
+    }
+    if (ui->chkReadPriceList->isChecked()) {
+        setMessage(QStringLiteral("קורא את כל המחירונים..."));
+        if (!ReadPriceListPriority(conn, tempItemsDb, fromSort, toSort, false, QStringLiteral("tTempPriceList")))
+            return;
+    }
+    setMessage(QStringLiteral("מעדכן נתוני פריטים בטבלאות ראשיות..."));
+    QString mergeError;
+    if (!tagora::UpdateMainItemTables(tempItemsDb, &mergeError))
+        return fail(mergeError);
+    if (!QFileInfo::exists(tempDocsDb)) {
+        setMessage(QStringLiteral("מכין את בסיס הנתונים..."));
+        if (CreateTempDocsDB(dataFile(dbfiles::Config), itemsDb, tempDocsDb, &e).isEmpty())
+            return fail(e.message);
+    }
+    if (ui->chkReadPriceList->isChecked()) {
+        setMessage(QStringLiteral("קורא את שמות המחירונים..."));
+        if (!ReadPriceListNamePriority(conn, tempDocsDb))
+            return;
+    }
+    setProgress(1.0);
+    setMessage(QStringLiteral("הייבוא הסתיים בהצלחה"));
+}
+
+} // namespace tagora

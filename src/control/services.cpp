@@ -1,0 +1,12 @@
+#include "control/services.h"
+
+#include <QDialog>
+
+namespace tagora {
+
+int DialogRunner::run(QDialog& dialog)
+{
+    return dialog.exec();
+}
+
+} // namespace tagora

@@ -1,0 +1,66 @@
+#include "erp/demosetup.h"
+
+#include "control/settingsstore.h"
+#include "control/settingstable.h"
+#include "erp/connparams.h"
+#include "localdb/database.h"
+
+#include <QDir>
+#include <QFileInfo>
+
+#include <odbcinst.h>
+
+namespace tagora {
+
+namespace {
+const char* kSqliteDriver = "SQLite3";
+}
+
+QString RegisterSqliteDsn(const QString& dsn, const QString& databasePath)
+{
+    SQLSetConfigMode(ODBC_USER_DSN);
+    const QByteArray name = dsn.toUtf8();
+    const QByteArray path = QFileInfo(databasePath).absoluteFilePath().toUtf8();
+    bool ok = SQLWriteDSNToIni(name.constData(), kSqliteDriver)
+        && SQLWritePrivateProfileString(name.constData(), "Database", path.constData(), "odbc.ini")
+        // Waits briefly rather than failing when another reader holds the file.
+        && SQLWritePrivateProfileString(name.constData(), "Timeout", "5000", "odbc.ini");
+    SQLSetConfigMode(ODBC_BOTH_DSN);
+    if (ok)
+        return QString();
+    DWORD code = 0;
+    char message[512] = {};
+    WORD len = 0;
+    SQLInstallerError(1, &code, message, sizeof(message) - 1, &len);
+    return QStringLiteral("לא ניתן לרשום את מקור הנתונים %1: %2").arg(dsn, QString::fromUtf8(message, len));
+}
+
+QString SetupDemoCompany(const QString& folder, const DemoOptions& options, SettingsStore& store)
+{
+    const QDir root(folder);
+    if (!QDir().mkpath(root.filePath(QStringLiteral("erp"))) || !QDir().mkpath(root.filePath(QStringLiteral("data"))))
+        return QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(QDir::toNativeSeparators(folder));
+    const QString erpFile = QFileInfo(root.filePath(QStringLiteral("erp/demo.sqlite"))).absoluteFilePath();
+    if (const DbError e = CreateDemoErp(erpFile, options))
+        return e.message;
+    if (const QString e = RegisterSqliteDsn(kDemoDsn, erpFile); !e.isEmpty())
+        return e;
+
+    const std::pair<const char*, QString> params[] = {
+        {"ConnServer", kDemoDsn},
+        {"ConnUID", QStringLiteral("sa")},
+        {"ConnPWD", QString()},
+        {"ConnDataBase", QStringLiteral("demo")},
+        {"ConnType", QString::number(options.connType == 2 ? 1 : 0)},
+        {"ConnPath", QFileInfo(erpFile).absolutePath()},
+    };
+    for (const auto& [key, value] : params)
+        store.setValue(kSettingsApp, kParamsSection, QLatin1String(key), value);
+    store.setValue(kSettingsApp, QStringLiteral("GeneralParams"), QStringLiteral("DBPath"),
+                   QFileInfo(root.filePath(QStringLiteral("data"))).absoluteFilePath());
+    if (!store.flush())
+        return QStringLiteral("לא ניתן לכתוב את ההגדרות");
+    return QString();
+}
+
+} // namespace tagora

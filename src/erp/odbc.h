@@ -1,0 +1,98 @@
+#pragma once
+
+#include <QString>
+#include <QStringList>
+#include <QVariant>
+#include <memory>
+#include <vector>
+
+namespace tagora {
+
+// Read-only access to the ERP's database through ODBC. The system never
+// writes there: connections are opened in read-only mode and only queries
+// are sent. Nothing here shows anything; every failure comes back as the
+// driver's own message.
+class ErpRecordset;
+
+class ErpConnection {
+public:
+    ErpConnection();
+    ~ErpConnection();
+    ErpConnection(const ErpConnection&) = delete;
+    ErpConnection& operator=(const ErpConnection&) = delete;
+
+    // Connects with the connection text as it stands ("DSN=...;Uid=...;pwd=..."
+    // or any ODBC connection text). The time-out bounds the login and each
+    // query, so an unreachable server ends in an error, not a hang.
+    bool open(const QString& connectionText, int timeoutSeconds, QString* error);
+    void close();
+    bool isOpen() const;
+
+    // The server's own name for itself ("SQLite", "PostgreSQL", ...).
+    QString dbmsName() const { return m_dbms; }
+    bool isSqlite() const;
+    // The connection's default database (for a file-based driver, its path).
+    QString currentCatalog() const;
+
+    // Opens a forward-only, read-only recordset. Null when the query failed
+    // (the driver's message in error).
+    std::unique_ptr<ErpRecordset> query(const QString& sql, QString* error);
+
+    // The number of rows a query returns, by a count over it, or -1 when the
+    // server cannot count it (progress then shows nothing).
+    long long countRows(const QString& sql, QString* error = nullptr);
+
+    // The text actually sent for a query: SQLite, standing in for the ERP's
+    // server, lacks two literal forms the readers use (N'text' and
+    // #dd/mm/yyyy#), so for SQLite alone they are rewritten.
+    QString dialectSql(const QString& sql) const;
+    static QString rewriteForSqlite(const QString& sql);
+
+private:
+    friend class ErpRecordset;
+    struct Handles;
+    std::unique_ptr<Handles> m_h;
+    QString m_dbms;
+    int m_timeout = 0;
+};
+
+class ErpRecordset {
+public:
+    ~ErpRecordset();
+    // Moves to the next row; false at the end or on an error (see error()).
+    bool next();
+    bool failed() const { return !m_error.isEmpty(); }
+    QString error() const { return m_error; }
+
+    int columnCount() const { return int(m_columns.size()); }
+    QString columnName(int i) const { return m_columns[size_t(i)].name; }
+    // By name or alias, without regard to case; -1 when absent.
+    int columnIndex(const QString& name) const;
+    // The current row's value: null for SQL NULL; whole numbers as qlonglong,
+    // decimals as double, text as QString, dates as QDate or QDateTime.
+    QVariant value(int i) const { return m_row[size_t(i)]; }
+    QVariant value(const QString& name) const;
+    bool has(const QString& name) const { return columnIndex(name) >= 0; }
+
+private:
+    friend class ErpConnection;
+    struct Column {
+        QString name;
+        short sqlType;
+    };
+    ErpRecordset(void* stmt);
+    bool describe();
+    QVariant fetchValue(int i);
+
+    void* m_stmt;
+    std::vector<Column> m_columns;
+    std::vector<QVariant> m_row;
+    QString m_error;
+};
+
+// Quotes a value for an ODBC connection text when it needs it: a value with
+// ";", "{" or "}", or with blanks at either end, goes between braces with
+// every "}" doubled. Any other value is returned unchanged.
+QString odbcConnValue(const QString& value);
+
+} // namespace tagora

@@ -1,0 +1,298 @@
+#include "erp/textconv.h"
+
+#include <cmath>
+#include <optional>
+
+namespace tagora {
+
+namespace {
+short s_connType = 1;
+
+const QDate kSerialZero(1899, 12, 30);
+
+bool isRunChar(QChar c)
+{
+    const ushort u = c.unicode();
+    return (u >= '0' && u <= '9') || (u >= 'A' && u <= 'Z') || (u >= 'a' && u <= 'z');
+}
+
+bool isJoiner(QChar c)
+{
+    const ushort u = c.unicode();
+    return u == '+' || u == '-' || u == '.' || u == '/' || u == '\\';
+}
+
+QChar mirrorBracket(QChar c)
+{
+    switch (c.unicode()) {
+    case '(': return QLatin1Char(')');
+    case ')': return QLatin1Char('(');
+    case '[': return QLatin1Char(']');
+    case ']': return QLatin1Char('[');
+    case '{': return QLatin1Char('}');
+    case '}': return QLatin1Char('{');
+    default: return c;
+    }
+}
+
+QChar mirrorChar(QChar c)
+{
+    switch (c.unicode()) {
+    case '<': return QLatin1Char('>');
+    case '>': return QLatin1Char('<');
+    default: return mirrorBracket(c);
+    }
+}
+
+bool isNullish(const QVariant& v)
+{
+    return !v.isValid() || v.isNull();
+}
+
+// Whole-number rounding as the platform's conversions did it: halves to even.
+long long roundHalfEven(double d)
+{
+    const double r = std::nearbyint(d);
+    return static_cast<long long>(r);
+}
+
+std::optional<QDateTime> asDateTime(const QVariant& v)
+{
+    switch (v.metaType().id()) {
+    case QMetaType::QDateTime: return v.toDateTime();
+    case QMetaType::QDate: return QDateTime(v.toDate(), QTime(0, 0));
+    case QMetaType::QString: {
+        const QString t = v.toString().trimmed();
+        QDateTime dt = QDateTime::fromString(t, Qt::ISODate);
+        if (!dt.isValid())
+            dt = QDateTime::fromString(t, QStringLiteral("yyyy-MM-dd HH:mm:ss"));
+        if (!dt.isValid()) {
+            const QDate d = QDate::fromString(t, Qt::ISODate);
+            if (d.isValid())
+                dt = QDateTime(d, QTime(0, 0));
+        }
+        if (dt.isValid())
+            return dt;
+        return std::nullopt;
+    }
+    default: return std::nullopt;
+    }
+}
+} // namespace
+
+short erpConnType()
+{
+    return s_connType;
+}
+
+void setErpConnType(short type)
+{
+    s_connType = type;
+}
+
+QString VisualToLogical(const QString& text, short connType)
+{
+    if (connType != 0 && connType != 1)
+        return text;
+    QString result;
+    QString run;
+    result.reserve(text.size());
+    for (const QChar c : text) {
+        const QChar m = mirrorBracket(c);
+        if (isRunChar(c)) {
+            run += m;
+        } else if (isJoiner(c)) {
+            if (!run.isEmpty())
+                run += m;
+            else
+                result.prepend(m);
+        } else {
+            if (!run.isEmpty()) {
+                result.prepend(run);
+                run.clear();
+            }
+            result.prepend(m);
+        }
+    }
+    if (!run.isEmpty())
+        result.prepend(run);
+    return result;
+}
+
+QString VisualToLogical(const QString& text)
+{
+    return VisualToLogical(text, s_connType);
+}
+
+QString ReverseForCells(const QString& text, short connType)
+{
+    QString out;
+    out.reserve(text.size() * 2 + 1);
+    for (int i = text.size() - 1; i >= 0; --i) {
+        out += kCellSeparator;
+        out += mirrorChar(text[i]);
+    }
+    out += kCellSeparator;
+    if (connType == 2)
+        std::reverse(out.begin(), out.end());
+    return out;
+}
+
+QString ReverseForCells(const QString& text)
+{
+    return ReverseForCells(text, s_connType);
+}
+
+bool HasHebrewLetters(const QString& text)
+{
+    // Windows-1255 codes 224..250 are exactly the letters alef to tav, U+05D0..U+05EA.
+    for (const QChar c : text)
+        if (c.unicode() >= 0x05D0 && c.unicode() <= 0x05EA)
+            return true;
+    return false;
+}
+
+namespace {
+// The guards both ERP text conversions share: the default for nothing, and
+// the conversion only for Hebrew text of a visual-order connection.
+template <class Convert>
+QString convertHebrew(const QVariant& value, const QString& defaultText, Convert convert)
+{
+    if (isNullish(value))
+        return defaultText;
+    const QString t = value.toString();
+    if (t.isEmpty())
+        return defaultText;
+    if ((s_connType == 0 || s_connType == 1) && HasHebrewLetters(t))
+        return convert(t, s_connType);
+    return t;
+}
+} // namespace
+
+QString ConvertErpText(const QVariant& value, const QString& defaultText)
+{
+    return convertHebrew(value, defaultText, [](const QString& t, short type) { return VisualToLogical(t, type); });
+}
+
+QString ConvertErpLabelText(const QVariant& value, const QString& defaultText)
+{
+    return convertHebrew(value, defaultText, [](const QString& t, short type) { return ReverseForCells(t, type); });
+}
+
+QString ErpTextOrNbsp(const QVariant& value)
+{
+    if (isNullish(value))
+        return QStringLiteral("&nbsp;");
+    return ConvertErpText(value, QString());
+}
+
+QString NullToNbsp(const QVariant& value)
+{
+    if (isNullish(value))
+        return QStringLiteral("&nbsp;");
+    return value.toString();
+}
+
+QString NullTrim(const QVariant& value)
+{
+    if (isNullish(value))
+        return QString();
+    return value.toString().trimmed();
+}
+
+double NullToDouble(const QVariant& value)
+{
+    if (isNullish(value))
+        return 0;
+    bool ok = false;
+    const double d = value.toString().trimmed().toDouble(&ok);
+    return ok && std::isfinite(d) ? d : 0;
+}
+
+short NullToInteger(const QVariant& value)
+{
+    if (isNullish(value))
+        return 0;
+    const double d = NullToDouble(value);
+    const long long n = roundHalfEven(d);
+    if (n < -32768 || n > 32767)
+        return 0;
+    return short(n);
+}
+
+QString QuoteToApostrophe(const QString& text)
+{
+    QString t = text;
+    t.replace(QLatin1Char('"'), QLatin1Char('\''));
+    return t;
+}
+
+QDate serialToDate(long long serial)
+{
+    return kSerialZero.addDays(serial);
+}
+
+double dateToSerial(const QDateTime& when)
+{
+    const double days = double(kSerialZero.daysTo(when.date()));
+    return days + when.time().msecsSinceStartOfDay() / 86400000.0;
+}
+
+QVariant ErpToDate(const QVariant& value, short connType)
+{
+    if (isNullish(value))
+        return QVariant();
+    if (connType != 2)
+        return value;
+    bool ok = false;
+    const double minutes = value.toDouble(&ok);
+    if (!ok)
+        return value;
+    const double serial = minutes / 1440.0 + kErpEpochSerial;
+    const double whole = std::floor(serial);
+    const QDate date = serialToDate(static_cast<long long>(whole));
+    const qint64 ms = static_cast<qint64>(std::llround((serial - whole) * 86400000.0));
+    return QDateTime(date, QTime(0, 0)).addMSecs(ms);
+}
+
+QVariant ErpToDate(const QVariant& value)
+{
+    return ErpToDate(value, s_connType);
+}
+
+QVariant DateToErp(const QVariant& value, short connType)
+{
+    if (isNullish(value))
+        return QVariant();
+    if (connType != 2)
+        return value;
+    const auto when = asDateTime(value);
+    if (!when)
+        return QVariant();
+    const long long day = roundHalfEven(dateToSerial(*when));
+    return QVariant(qint32((day - kErpEpochSerial) * 1440));
+}
+
+QVariant DateToErp(const QVariant& value)
+{
+    return DateToErp(value, s_connType);
+}
+
+QString DateToErpLiteral(const QVariant& value, short connType)
+{
+    if (isNullish(value))
+        return QString();
+    if (connType == 2)
+        return DateToErp(value, 2).toString();
+    const auto when = asDateTime(value);
+    if (!when)
+        return QString();
+    return QLatin1Char('#') + when->date().toString(QStringLiteral("dd/MM/yyyy")) + QLatin1Char('#');
+}
+
+QString DateToErpLiteral(const QVariant& value)
+{
+    return DateToErpLiteral(value, s_connType);
+}
+
+} // namespace tagora

@@ -1,0 +1,301 @@
+// The item import against the demo company, read through the SQLite ODBC
+// driver as the ERP would be read.
+#include "support/cardfixture.h"
+#include "support/dbrows.h"
+#include "support/erpfixture.h"
+
+#include "erp/connparams.h"
+#include "erp/itemimport.h"
+#include "erp/textconv.h"
+#include "localdb/database.h"
+#include "localdb/schema.h"
+
+#include <QCheckBox>
+#include <QLineEdit>
+#include <QPushButton>
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+const QString kDsn1 = QStringLiteral("TagoraDemo1");
+const QString kDsn2 = QStringLiteral("TagoraDemo2");
+
+QString conn(short type)
+{
+    return BuildConnString(type == 1 ? kDsn1 : kDsn2, "sa", QVariant(), "demo", type);
+}
+
+} // namespace
+
+class TestItemImport : public QObject {
+    Q_OBJECT
+    OdbcSandbox odbc;
+    QTemporaryDir work;
+    QString erp2;
+    QDate today = QDate::currentDate();
+    int fresh = 0;
+
+    QString newItemsDb()
+    {
+        const QString path = work.filePath(QStringLiteral("items%1.tdb").arg(++fresh));
+        DbError e;
+        if (CreateItemsDB(path, &e).isEmpty())
+            qFatal("%s", qPrintable(e.message));
+        return path;
+    }
+
+    QString newStaging(const QString& items)
+    {
+        const QString path = work.filePath(QStringLiteral("staging%1.tmp").arg(++fresh));
+        DbError e;
+        if (CreateTempItemsDB(path, items, &e).isEmpty())
+            qFatal("%s", qPrintable(e.message));
+        return path;
+    }
+
+    ErpReadContext ctx(short type) { return ErpReadContext{conn(type), nullptr, QString(), today}; }
+
+private slots:
+    void initTestCase()
+    {
+        DemoOptions o;
+        o.today = today;
+        o.connType = 1;
+        odbc.addDemo(kDsn1, o);
+        o.connType = 2;
+        erp2 = odbc.addDemo(kDsn2, o);
+    }
+
+    // Both connection types describe the same company: once converted, the
+    // items must come out the same (the cell form alone keeps each type's order).
+    void connectionTypesAgree_data()
+    {
+        QTest::addColumn<int>("priceList");
+        QTest::addColumn<bool>("foreign");
+        QTest::addColumn<bool>("warehouse");
+        QTest::newRow("plain") << 0 << false << false;
+        QTest::newRow("price list and warehouse") << 1 << false << true;
+        QTest::newRow("foreign names in another list") << 2 << true << false;
+    }
+    void connectionTypesAgree()
+    {
+        QFETCH(int, priceList);
+        QFETCH(bool, foreign);
+        QFETCH(bool, warehouse);
+        QStringList result[2];
+        for (short type : {1, 2}) {
+            const QString db = newItemsDb();
+            ReadError e;
+            QVERIFY2(ReadItemPriority(ctx(type), db, {}, {}, foreign, 3, priceList, false, warehouse, &e),
+                     qPrintable(e.title + e.message));
+            QVERIFY(ReadItemFName(ctx(type), db, {}, {}, false, &e));
+            // Location names are stored as the ERP sends them, so they are left out here.
+            result[type - 1] = rows(db, "SELECT ItemKey, ItemName, ItemSort, Unit, BarCode, Price, Coin, Copies, "
+                                        "PurPackUN, Local IS NULL, Fname FROM tItems ORDER BY ItemKey");
+        }
+        QVERIFY(result[1].size() > 10);
+        QCOMPARE(result[0], result[1]);
+    }
+
+    void itemRules()
+    {
+        const QString db = newItemsDb();
+        ReadError e;
+        QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, false, 2, 0, false, false, &e));
+        // Every R or P item with a key, and no other.
+        const int erpItems = scalar(erp2, "SELECT count(*) FROM PART, FAMILY, UNIT WHERE TYPE IN ('R','P') "
+                                          "AND FAMILY.FAMILY = PART.FAMILY AND UNIT.UNIT = PART.UNIT "
+                                          "AND trim(PARTNAME) <> ''").toInt();
+        QCOMPARE(scalar(db, "SELECT count(*) FROM tItems").toInt(), erpItems);
+        QCOMPARE(rows(db, "SELECT DISTINCT Price || Coin FROM tItems"), QStringList{"0.0$"});
+        QCOMPARE(rows(db, "SELECT DISTINCT Local FROM tItems"), QStringList{"0"});
+        QCOMPARE(rows(db, "SELECT DISTINCT Copies || '/' || PurPackUN FROM tItems"), QStringList{"2/1.0"});
+        QCOMPARE(scalar(db, "SELECT count(*) FROM tItems WHERE ItemKey LIKE '%\"%' OR ItemKey <> trim(ItemKey)").toInt(), 0);
+        QCOMPARE(scalar(db, "SELECT count(*) FROM tItems WHERE ItemKey IN ('AB''12', 'LEAD-7', 'TRAIL-8', 'O''R-5')").toInt(), 4);
+        // The cell form of the description.
+        const QString cells = scalar(db, "SELECT VNItemName FROM tItems WHERE ItemKey = 'AB''12'").toString();
+        QCOMPARE(cells, ReverseForCells(scalar(db, "SELECT ItemName FROM tItems WHERE ItemKey = 'AB''12'").toString(), 2));
+    }
+
+    // A second import finds the keys it wrote (quotes included) and keeps the marks.
+    void secondImportUpdates()
+    {
+        const QString db = newItemsDb();
+        ReadError e;
+        QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, false, 1, 1, false, false, &e));
+        const int first = scalar(db, "SELECT count(*) FROM tItems").toInt();
+        {
+            Database d;
+            QVERIFY(!d.open(db));
+            QVERIFY(!d.exec("UPDATE tItems SET PrintLabel = TRUE, Copies = 9, Price = -1 WHERE ItemKey = 'AB''12'"));
+        }
+        QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, false, 1, 1, false, false, &e));
+        QCOMPARE(scalar(db, "SELECT count(*) FROM tItems").toInt(), first);
+        QCOMPARE(rows(db, "SELECT PrintLabel, Copies, Price > 0 FROM tItems WHERE ItemKey = 'AB''12'"), QStringList{"1|1|1"});
+    }
+
+    void foreignNameMode()
+    {
+        const QString db = newItemsDb();
+        ReadError e;
+        // Standard names first, then foreign: an item without a foreign name keeps its Hebrew one.
+        QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, false, 1, 0, false, false, &e));
+        const QStringList before = rows(db, "SELECT ItemKey, ItemName FROM tItems ORDER BY ItemKey");
+        QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, true, 1, 0, false, false, &e));
+        const QStringList foreignRows = rows(erp2, "SELECT trim(replace(PARTNAME, '\"', '''')) AS k, coalesce(trim(EPARTDES), '') "
+                                                   "FROM PART JOIN PARTDES USING (PART) WHERE TYPE IN ('R','P') AND trim(PARTNAME) <> ''");
+        int withForeign = 0, without = 0;
+        for (const QString& r : foreignRows) {
+            const QString key = r.section('|', 0, 0), foreign = r.section('|', 1);
+            const QString name = scalar(db, QStringLiteral("SELECT ItemName FROM tItems WHERE ItemKey = '%1'")
+                                                .arg(QString(key).replace("'", "''"))).toString();
+            if (foreign.isEmpty()) {
+                ++without;
+                const QString old = before.filter(QRegularExpression("^" + QRegularExpression::escape(key) + "\\|")).value(0);
+                QCOMPARE(key + "|" + name, old);
+            } else {
+                ++withForeign;
+                QCOMPARE(name, foreign);
+            }
+        }
+        QVERIFY(withForeign > 0 && without > 0);
+        // A new row without a foreign name gets no name at all.
+        const QString empty = newItemsDb();
+        QVERIFY(ReadItemPriority(ctx(2), empty, {}, {}, true, 1, 0, false, false, &e));
+        QVERIFY(scalar(empty, "SELECT count(*) FROM tItems WHERE ItemName IS NULL").toInt() == without);
+    }
+
+    void familyRange()
+    {
+        const QString db = newItemsDb();
+        ReadError e;
+        QVERIFY(ReadItemPriority(ctx(2), db, "200", "300", false, 1, 0, false, false, &e));
+        QCOMPARE(rows(db, "SELECT DISTINCT ItemSort FROM tItems ORDER BY 1"), QStringList({"200", "300"}));
+        // A bound holding an apostrophe is a value, not SQL.
+        QVERIFY(ReadItemPriority(ctx(2), db, "2'00", "", false, 1, 0, false, false, &e));
+    }
+
+    // Special prices valid today: the day a price ends is still in, the day after it starts is not yet.
+    void specialPriceWindow_data()
+    {
+        QTest::addColumn<int>("type");
+        QTest::newRow("dates as dates") << 1;
+        QTest::newRow("dates as minutes") << 2;
+    }
+    void specialPriceWindow()
+    {
+        QFETCH(int, type);
+        const QString staging = newStaging(newItemsDb());
+        ReadError e;
+        QVERIFY2(ReadAlterPricePRIORITY(ctx(short(type)), staging, false, "tTempAlterPrices", &e), qPrintable(e.message));
+        const int todayMinutes = int(QDate(1988, 1, 1).daysTo(today)) * 1440;
+        const QString window = QStringLiteral("FROMDATE <= %1 AND EXPIRYDATE >= %1").arg(todayMinutes);
+        // A repeated account and item is staged once.
+        const QStringList expected = rows(erp2, "SELECT DISTINCT trim(CUSTNAME) || '|' || replace(trim(PARTNAME), '\"', '''') FROM CUSTPARTPRICE "
+                                                "JOIN CUSTOMERS USING (CUST) JOIN PART USING (PART) WHERE " + window +
+                                                " ORDER BY 1");
+        QCOMPARE(rows(staging, "SELECT AccountKey || '|' || ItemKey FROM tTempAlterPrices ORDER BY 1"), expected);
+        // The item key takes an apostrophe for its double quote, as in tItems, so the price is found for it.
+        QVERIFY(expected.contains("CH-100|AB'12"));
+        QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE EXPIRYDATE = %1").arg(todayMinutes)).toInt() > 0);
+        QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE FROMDATE = %1").arg(todayMinutes + 1440)).toInt() > 0);
+    }
+
+    void alternateKeysAndPriceLists()
+    {
+        const QString items = newItemsDb();
+        const QString staging = newStaging(items);
+        ReadError e;
+        QVERIFY(ReadAlterKeyPRIORITY(ctx(2), staging, false, "tTempAlterKeys", &e));
+        QVERIFY(ReadAlterKeySupPRIORITY(ctx(2), staging, false, "tTempAlterKeys", &e));
+        QVERIFY(ReadPriceListPriority(ctx(2), staging, {}, {}, false, "tTempPriceList", &e));
+        // A repeated account and item keeps its first row; an empty part number becomes "?".
+        QVERIFY(scalar(staging, "SELECT count(*) FROM tTempAlterKeys WHERE AlterNum = '?'").toInt() > 0);
+        // Account keys keep their double quotes; only item keys trade them for apostrophes.
+        QVERIFY(scalar(staging, "SELECT count(*) FROM tTempAlterKeys WHERE AccountKey = 'A\"B-2'").toInt() > 0);
+        QCOMPARE(scalar(staging, "SELECT count(*) FROM tTempAlterKeys WHERE ItemKey LIKE '%\"%'").toInt(), 0);
+        QCOMPARE(scalar(staging, "SELECT count(*) FROM tTempPriceList WHERE PriceList = 0").toInt(), 0);
+        QVERIFY(scalar(staging, "SELECT count(*) FROM tTempPriceList WHERE Currency = '?'").toInt() > 0);
+        QVERIFY(scalar(staging, "SELECT count(*) FROM tTempPriceList WHERE PriceList = -50").toInt() > 0);
+        QString mergeError;
+        QVERIFY(UpdateMainItemTables(staging, &mergeError));
+        QCOMPARE(rows(items, "SELECT * FROM tPriceList ORDER BY 1, 2"), rows(staging, "SELECT * FROM tTempPriceList ORDER BY 1, 2"));
+        QCOMPARE(scalar(items, "SELECT count(*) FROM tAlterKeys").toInt(), scalar(staging, "SELECT count(*) FROM tTempAlterKeys").toInt());
+    }
+
+    void unreachableErp_data()
+    {
+        QTest::addColumn<QString>("connection");
+        QTest::newRow("unknown data source") << "DSN=NoSuchSource;Uid=sa;pwd=";
+        QTest::newRow("server refusing") << "Driver=PostgreSQL Unicode;Servername=127.0.0.1;Port=1;Database=x;Username=x";
+    }
+    void unreachableErp()
+    {
+        QFETCH(QString, connection);
+        const QString db = newItemsDb();
+        ReadError e;
+        ErpReadContext c{connection, nullptr, QString(), today};
+        QVERIFY(!ReadItemPriority(c, db, {}, {}, false, 1, 0, false, false, &e));
+        QCOMPARE(e.title, QString("Error reading item: "));
+        QVERIFY(!e.message.isEmpty());
+        QVERIFY(ReadPriceFields(connection, &e.message).isEmpty());
+    }
+
+    // The whole command, as a user runs it from the tab.
+    void importCommand_data()
+    {
+        QTest::addColumn<bool>("cleanItems");
+        QTest::addColumn<bool>("cleanAlter");
+        QTest::addColumn<bool>("answer");
+        QTest::addColumn<bool>("definitionsKept");
+        QTest::addColumn<QString>("message");
+        QTest::newRow("plain") << false << false << true << true << QString::fromUtf8("הייבוא הסתיים בהצלחה");
+        QTest::newRow("clean items") << true << false << true << true << QString::fromUtf8("הייבוא הסתיים בהצלחה");
+        QTest::newRow("both cleans rebuild") << true << true << true << false << QString::fromUtf8("הייבוא הסתיים בהצלחה");
+        QTest::newRow("declined") << true << true << false << true << QString("untouched");
+    }
+    void importCommand()
+    {
+        QFETCH(bool, cleanItems);
+        QFETCH(bool, cleanAlter);
+        QFETCH(bool, answer);
+        QFETCH(bool, definitionsKept);
+        QFETCH(QString, message);
+        const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
+        QVERIFY(!PrepareDataFolder(data));
+        const QString items = data + "/" + dbfiles::Items;
+        {
+            Database d;
+            QVERIFY(!d.open(items));
+            QVERIFY(!d.exec("INSERT INTO tAccountDef (AccountKey, LabelName) VALUES ('C1', 'x.lbl');"
+                            "INSERT INTO tItems (ItemKey) VALUES ('GONE-FROM-ERP')"));
+        }
+        const QByteArray ini = QStringLiteral("[Params]\nConnServer=%1\nConnType=1\n[GeneralParams]\nDBPath=%2\n"
+                                              "[ImportItems]\nPriceField=1\nImportAlterKeys=1\nReadPriceList=1\n")
+                                   .arg(kDsn2, data).toUtf8();
+        CardFixture f(ini);
+        QVERIFY2(f.showMessages.isEmpty(), qPrintable(f.showMessages.join('\n')));
+        QVERIFY(f.c<QComboBox>("cmbPriceField")->count() > 2);
+        f.prompt->queueAnswer(answer);
+        f.c<QCheckBox>("ChkClean")->setChecked(cleanItems);
+        f.c<QCheckBox>("ChkCleanAlterKeys")->setChecked(cleanAlter);
+        f.c<QPushButton>("CmdImportItems")->click();
+        QVERIFY2(f.prompt->criticalCount() == 0, qPrintable(f.prompt->lines().join('\n')));
+        QCOMPARE(scalar(items, "SELECT count(*) FROM tAccountDef").toInt(), definitionsKept ? 1 : 0);
+        if (message == "untouched") {
+            QCOMPARE(scalar(items, "SELECT count(*) FROM tItems").toInt(), 1);
+            return;
+        }
+        QCOMPARE(f.card->message(), message);
+        QCOMPARE(f.card->progress(), 1.0);
+        QCOMPARE(scalar(items, "SELECT count(*) FROM tItems WHERE ItemKey = 'GONE-FROM-ERP'").toInt(), cleanItems ? 0 : 1);
+        QVERIFY(scalar(items, "SELECT count(*) FROM tAlterKeys").toInt() > 0);
+        QVERIFY(scalar(items, "SELECT count(*) FROM tItems WHERE Price > 0 AND Coin <> '$'").toInt() > 0);
+        QVERIFY(scalar(data + "/" + dbfiles::TempDocs, "SELECT count(*) FROM tPLName").toInt() > 0);
+        QCOMPARE(scalar(items, "SELECT count(*) FROM tAccountDef WHERE Label2Name IS NULL").toInt(), definitionsKept ? 1 : 0);
+    }
+};
+
+QTEST_MAIN(TestItemImport)
+#include "tst_itemimport.moc"

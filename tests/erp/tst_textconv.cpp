@@ -1,0 +1,201 @@
+#include "erp/connparams.h"
+#include "erp/odbc.h"
+#include "erp/textconv.h"
+
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+// Writes a text given as its characters in reading order (א = alef ...).
+QString chars(const char* utf8)
+{
+    return QString::fromUtf8(utf8);
+}
+const QChar S = kCellSeparator;
+} // namespace
+
+class TestTextConv : public QObject {
+    Q_OBJECT
+private slots:
+    void init() { setErpConnType(1); }
+
+    void visualToLogical_data()
+    {
+        QTest::addColumn<QString>("visual");
+        QTest::addColumn<QString>("logical");
+        QTest::newRow("hebrew then digits") << chars("םולש 123") << chars("123 שלום");
+        QTest::newRow("run with joiner and brackets") << chars("ב(12-34)א") << chars("א(12-34)ב");
+        QTest::newRow("joiner without run") << chars("-א") << chars("א-");
+        QTest::newRow("latin word keeps order") << chars("םוקמ ABC") << chars("ABC מקום");
+        QTest::newRow("decimal number") << chars("ח\"ש 12.50") << chars("12.50 ש\"ח");
+        QTest::newRow("empty") << QString() << QString();
+    }
+    void visualToLogical()
+    {
+        QFETCH(QString, visual);
+        QFETCH(QString, logical);
+        QCOMPARE(VisualToLogical(visual, 1), logical);
+        QCOMPARE(VisualToLogical(visual, 0), logical);
+        QCOMPARE(VisualToLogical(visual, 2), visual);
+    }
+
+    void convertErpText_data()
+    {
+        QTest::addColumn<int>("type");
+        QTest::addColumn<QVariant>("value");
+        QTest::addColumn<QString>("expected");
+        QTest::newRow("null gives default") << 1 << QVariant() << "?";
+        QTest::newRow("empty gives default") << 2 << QVariant(QString()) << "?";
+        QTest::newRow("no hebrew unchanged") << 1 << QVariant(QString("(A1) [x]")) << "(A1) [x]";
+        QTest::newRow("type 1 converted") << 1 << QVariant(chars("םולש")) << chars("שלום");
+        QTest::newRow("type 0 like type 1") << 0 << QVariant(chars("םולש")) << chars("שלום");
+        QTest::newRow("type 2 as it comes") << 2 << QVariant(chars("שלום")) << chars("שלום");
+        QTest::newRow("number") << 1 << QVariant(12) << "12";
+    }
+    void convertErpText()
+    {
+        QFETCH(int, type);
+        QFETCH(QVariant, value);
+        QFETCH(QString, expected);
+        setErpConnType(short(type));
+        QCOMPARE(ConvertErpText(value, "?"), expected);
+    }
+
+    void reverseForCells_data()
+    {
+        QTest::addColumn<int>("type");
+        QTest::addColumn<QString>("text");
+        QTest::addColumn<QString>("cells");
+        QTest::newRow("type 1") << 1 << chars("אב") << QString(S) + chars("ב") + S + chars("א") + S;
+        QTest::newRow("type 2") << 2 << chars("אב") << QString(S) + chars("א") + S + chars("ב") + S;
+        QTest::newRow("mirrored") << 1 << QString("(<") << QString(S) + '>' + S + ')' + S;
+        QTest::newRow("type 2 keeps mirror") << 2 << QString("(<") << QString(S) + ')' + S + '>' + S;
+        QTest::newRow("empty") << 1 << QString() << QString(S);
+    }
+    void reverseForCells()
+    {
+        QFETCH(int, type);
+        QFETCH(QString, text);
+        QFETCH(QString, cells);
+        QCOMPARE(ReverseForCells(text, short(type)), cells);
+        QCOMPARE(cells.size(), text.size() * 2 + 1);
+    }
+
+    void hebrewLetters_data()
+    {
+        QTest::addColumn<QString>("text");
+        QTest::addColumn<bool>("hebrew");
+        QTest::newRow("alef") << chars("א") << true;
+        QTest::newRow("tav") << chars("ת") << true;
+        QTest::newRow("final letters") << chars("ךםןףץ") << true;
+        QTest::newRow("points only") << chars("\u05B0\u05B4") << false;
+        QTest::newRow("cell separator") << QString(S) << false;
+        QTest::newRow("latin") << QString("abc") << false;
+    }
+    void hebrewLetters()
+    {
+        QFETCH(QString, text);
+        QFETCH(bool, hebrew);
+        QCOMPARE(HasHebrewLetters(text), hebrew);
+    }
+
+    void erpDates_data()
+    {
+        QTest::addColumn<int>("type");
+        QTest::addColumn<QVariant>("erp");
+        QTest::addColumn<QVariant>("date");
+        QTest::newRow("epoch") << 2 << QVariant(0) << QVariant(QDateTime(QDate(1988, 1, 1), QTime(0, 0)));
+        QTest::newRow("one day") << 2 << QVariant(1440) << QVariant(QDateTime(QDate(1988, 1, 2), QTime(0, 0)));
+        QTest::newRow("with time") << 2 << QVariant(1440 * 10 + 90) << QVariant(QDateTime(QDate(1988, 1, 11), QTime(1, 30)));
+        QTest::newRow("null") << 2 << QVariant() << QVariant();
+        QTest::newRow("type 1 unchanged") << 1 << QVariant(QDate(2024, 3, 5)) << QVariant(QDate(2024, 3, 5));
+    }
+    void erpDates()
+    {
+        QFETCH(int, type);
+        QFETCH(QVariant, erp);
+        QFETCH(QVariant, date);
+        QCOMPARE(ErpToDate(erp, short(type)), date);
+    }
+
+    void dateToErp_data()
+    {
+        QTest::addColumn<int>("type");
+        QTest::addColumn<QVariant>("date");
+        QTest::addColumn<QString>("literal");
+        QTest::newRow("minutes") << 2 << QVariant(QDate(1988, 1, 2)) << "1440";
+        QTest::newRow("afternoon moves to next day") << 2 << QVariant(QDateTime(QDate(1988, 1, 2), QTime(13, 0))) << "2880";
+        QTest::newRow("morning stays") << 2 << QVariant(QDateTime(QDate(1988, 1, 2), QTime(9, 0))) << "1440";
+        QTest::newRow("hash literal") << 1 << QVariant(QDate(2024, 3, 5)) << "#05/03/2024#";
+        QTest::newRow("null") << 2 << QVariant() << "";
+    }
+    void dateToErp()
+    {
+        QFETCH(int, type);
+        QFETCH(QVariant, date);
+        QFETCH(QString, literal);
+        QCOMPARE(DateToErpLiteral(date, short(type)), literal);
+    }
+
+    void nullHelpers()
+    {
+        QCOMPARE(NullTrim(QVariant()), QString());
+        QCOMPARE(NullTrim(QString("  a b  ")), QString("a b"));
+        QCOMPARE(NullToDouble(QString("x")), 0.0);
+        QCOMPARE(NullToDouble(QString(" 2.5 ")), 2.5);
+        QCOMPARE(NullToInteger(QVariant()), short(0));
+        QCOMPARE(NullToInteger(QString("7")), short(7));
+        QCOMPARE(QuoteToApostrophe("A\"1\""), QString("A'1'"));
+        QCOMPARE(ErpTextOrNbsp(QVariant()), QString("&nbsp;"));
+        QCOMPARE(NullToNbsp(QVariant(3)), QString("3"));
+    }
+
+    void connString_data()
+    {
+        QTest::addColumn<QString>("pwd");
+        QTest::addColumn<QVariant>("pwdValue");
+        QTest::addColumn<int>("type");
+        QTest::addColumn<QString>("expected");
+        QTest::newRow("plain") << "" << QVariant("secret") << 1 << "DSN=erp;Uid=sa;pwd=secret";
+        QTest::newRow("null password") << "" << QVariant() << 2 << "DSN=erp;Uid=sa;pwd=";
+        QTest::newRow("semicolon quoted") << "" << QVariant("a;b") << 2 << "DSN=erp;Uid=sa;pwd={a;b}";
+        QTest::newRow("brace doubled") << "" << QVariant("x}y") << 2 << "DSN=erp;Uid=sa;pwd={x}}y}";
+        QTest::newRow("unknown type") << "" << QVariant("x") << 3 << "";
+    }
+    void connString()
+    {
+        QFETCH(QVariant, pwdValue);
+        QFETCH(int, type);
+        QFETCH(QString, expected);
+        erpDialect() = ErpDialect{};
+        BuildConnString("erp", "sa", QVariant("warm"), "db", 2);
+        QCOMPARE(erpDialect().likeWildcard, QString("%"));
+        QCOMPARE(BuildConnString("erp", "sa", pwdValue, "db", short(type)), expected);
+        // An unknown type leaves the dialect of the last good one.
+        const bool typeTwo = type != 1;
+        QCOMPARE(erpDialect().likeWildcard, typeTwo ? QString("%") : QString("*"));
+        QCOMPARE(erpDialect().dateDelimiter, typeTwo ? QString("'") : QString("#"));
+    }
+
+    // SQLite stands in for the ERP's server; only its missing literal forms change.
+    void sqliteRewrite_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::addColumn<QString>("sent");
+        QTest::newRow("unicode literal") << "WHERE A = N'שלום'" << "WHERE A = 'שלום'";
+        QTest::newRow("date literal") << "D >= #05/03/2024# AND D <= #5/3/2024#" << "D >= '2024-03-05' AND D <= '2024-03-05'";
+        QTest::newRow("inside a string untouched") << "WHERE A = 'N''#05/03/2024#'" << "WHERE A = 'N''#05/03/2024#'";
+        QTest::newRow("identifier ending in N") << "SELECT PARTN'x'" << "SELECT PARTN'x'";
+        QTest::newRow("plain") << "SELECT 1" << "SELECT 1";
+    }
+    void sqliteRewrite()
+    {
+        QFETCH(QString, sql);
+        QFETCH(QString, sent);
+        QCOMPARE(ErpConnection::rewriteForSqlite(sql), sent);
+    }
+};
+
+QTEST_GUILESS_MAIN(TestTextConv)
+#include "tst_textconv.moc"
