@@ -10,6 +10,7 @@
 #include "control/settingsstore.h"
 #include "control/settingstable.h"
 #include "labels/labelfields.h"
+#include "labels/itemquery.h"
 #include "localdb/schema.h"
 
 #include "ui_maincard.h"
@@ -50,12 +51,6 @@ int leadingNumber(const QString& text)
     return int(negative ? -n : n);
 }
 
-QString sqlQuoted(const QString& value)
-{
-    QString v = value;
-    v.replace(QLatin1Char('\''), QLatin1String("''"));
-    return v;
-}
 } // namespace
 
 MainCard::MainCard(QWidget* parent, Services services)
@@ -449,19 +444,8 @@ QString MainCard::dataFile(const QString& fileName) const
 
 QString MainCard::itemRangeCriteria() const
 {
-    const std::pair<QLineEdit*, const char*> bounds[] = {
-        {ui->txtFromItem, " And ItemKey >= '"},
-        {ui->txtToItem, " And ItemKey <= '"},
-        {ui->txtFromSort, " And ItemSort >= '"},
-        {ui->txtToSort, " And ItemSort <= '"},
-    };
-    QString criteria;
-    for (const auto& [edit, fragment] : bounds) {
-        const QString value = edit->text().trimmed();
-        if (!value.isEmpty())
-            criteria += QLatin1String(fragment) + sqlQuoted(value) + QLatin1Char('\'');
-    }
-    return criteria;
+    return ItemRangeCriteria(ui->txtFromItem->text(), ui->txtToItem->text(), ui->txtFromSort->text(),
+                             ui->txtToSort->text());
 }
 
 // ------------------------------------------------------------------ printing

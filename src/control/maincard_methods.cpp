@@ -5,16 +5,6 @@
 
 namespace tagora {
 
-short MainCard::RunOLE(const QString&, short, uchar, short, const QString&, bool, bool)
-{
-    return 0;
-}
-
-QVariant MainCard::BuildItemQuery(uchar, uchar)
-{
-    return QVariant(QString());
-}
-
 QString MainCard::BuildDocRangeCriteria(const QVariantMap&, const QVariant&, const QVariant&, const QString&,
                                         const QString&, int, bool)
 {

@@ -11,6 +11,7 @@ class Prompt;
 class FileDialogProvider;
 class PrinterCatalog;
 class DialogRunner;
+class AutomationRegistry;
 
 // How a modal dialog is shown: on a screen it runs its own event loop; the
 // headless host and the tests drive it from their script instead.
@@ -29,6 +30,9 @@ struct Services {
     std::shared_ptr<FileDialogProvider> fileDialog;
     std::shared_ptr<PrinterCatalog> printers;
     std::shared_ptr<DialogRunner> dialogs;
+    // Providers of label programs' automation objects; the journal named in
+    // the settings serves every program without one.
+    std::shared_ptr<AutomationRegistry> automation;
 };
 
 } // namespace tagora

@@ -1,0 +1,85 @@
+// The control's side of label printing through a label program: the label
+// data query from the screen's settings, and the run.
+#include "control/maincard.h"
+
+#include "control/prompt.h"
+#include "control/settingsstore.h"
+#include "control/settingstable.h"
+#include "labels/automation.h"
+#include "labels/itemquery.h"
+#include "labels/labelfields.h"
+#include "labels/labelrun.h"
+
+#include "ui_maincard.h"
+
+#include <QApplication>
+#include <QCheckBox>
+#include <QLabel>
+#include <QLineEdit>
+
+namespace tagora {
+
+namespace {
+const QString kAutomationSection = QStringLiteral("Automation");
+const QString kJournalKey = QStringLiteral("JournalFile");
+} // namespace
+
+QVariant MainCard::BuildItemQuery(uchar pQueryType, uchar pOrderBy)
+{
+    LabelQuerySettings s;
+    for (int row = 0; row < LabelFieldCount; ++row) {
+        s.sent[size_t(row)] = control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState() == Qt::Checked;
+        if (auto* expr = control<QLineEdit>(QStringLiteral("txtFldExpr(%1)").arg(row)))
+            s.expressions[size_t(row)] = expr->text();
+    }
+    s.useAccountKey = ui->ChkUseAccountKey->checkState() == Qt::Checked;
+    s.accountKey = ui->txtAccountKey->text();
+    s.companyName = ui->txtCompanyName->text();
+    s.itemRangeCriteria = itemRangeCriteria();
+    return QVariant(tagora::BuildItemQuery(s, pQueryType, pOrderBy));
+}
+
+short MainCard::RunOLE(const QString& DefaultLabelName, short /*Copies*/, uchar pQueryType, short pServerType,
+                       const QString& pDBName, bool pPrintHeadLab, bool ByPlate)
+{
+    LabelRunRequest r;
+    r.defaultLabel = DefaultLabelName;
+    r.programCode = pServerType;
+    r.dbPath = pDBName;
+    r.printHeader = pPrintHeadLab;
+    r.byPlate = ByPlate;
+    r.delayText = ui->txtPrintDelay->text();
+    r.sheets = control<QRadioButton>(QStringLiteral("OptPrinter(0)"))->isChecked();
+    r.headerLabel = ui->txtLabelNameHead->text();
+    r.priceFormat = ui->txtPriceFormat->text();
+    // Roll printers take the labels last to first.
+    const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
+    r.sql = (ByPlate ? BuildItemQueryFromPlate(pQueryType, order) : BuildItemQuery(pQueryType, order)).toString();
+    for (int row = 0; row < LabelFieldCount; ++row) {
+        if (control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState() != Qt::Checked)
+            continue;
+        const auto* name = control<QLabel>(QStringLiteral("LblFldName(%1)").arg(row));
+        const auto* desc = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(row));
+        r.fields.push_back({name->text(), desc->property("Tag").toString(), name->property("Tag").toString() == QLatin1String("2")});
+    }
+
+    AutomationRegistry registry = m_services.automation ? *m_services.automation : AutomationRegistry();
+    const QString journal = m_services.settings->value(kSettingsApp, kAutomationSection, kJournalKey).value_or(QString());
+    if (!journal.trimmed().isEmpty())
+        registry.setFallback(std::make_shared<JournalProvider>(journal.trimmed()));
+
+    const LabelRunResult result = RunLabelProgram(r, registry, this, [] { QCoreApplication::processEvents(); });
+    switch (result.status) {
+    case LabelRunResult::Status::Done:
+        return -1;
+    case LabelRunResult::Status::NoRecords:
+        m_services.prompt->critical(titles::Fault, QStringLiteral("לא נבחרו פריטים להדפסה"));
+        return 0;
+    case LabelRunResult::Status::Failed:
+        m_services.prompt->critical(QStringLiteral("תקלה במשלוח נתונים להדפסה"), result.message);
+        return 0;
+    }
+    return 0;
+}
+
+} // namespace tagora

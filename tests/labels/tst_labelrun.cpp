@@ -1,0 +1,338 @@
+// Label runs through the journal: the calls each program gets, in order.
+#include "support/cardfixture.h"
+#include "support/labeldata.h"
+
+#include "labels/automation.h"
+#include "labels/itemquery.h"
+#include "labels/labelprograms.h"
+#include "labels/labelrun.h"
+
+#include <QCheckBox>
+#include <QLineEdit>
+#include <QPushButton>
+#include <QRadioButton>
+#include <QRegularExpression>
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+const QString kLabel = QStringLiteral("/l/a.lbl");
+
+QStringList readJournal(const QString& path, bool keepAnswers = false)
+{
+    QFile f(path);
+    if (!f.open(QIODevice::ReadOnly))
+        return {};
+    QStringList lines = QString::fromUtf8(f.readAll()).split('\n', Qt::SkipEmptyParts);
+    if (!keepAnswers)
+        for (QString& l : lines)
+            l.remove(QRegularExpression(" -> \\d+$"));
+    return lines;
+}
+
+// A provider whose objects fail one member, as a program would reject a call.
+class RefusingProvider : public AutomationProvider, public AutomationObject {
+public:
+    explicit RefusingProvider(QString refused) : m_refused(std::move(refused)) {}
+    std::shared_ptr<AutomationObject> create(const QString&, QString*) override
+    {
+        return std::shared_ptr<AutomationObject>(this, [](AutomationObject*) {});
+    }
+    bool call(const QString& member, const QVariantList& args, QVariant* result, QString* error) override
+    {
+        if (result)
+            *result = 42;
+        if (member == m_refused && args.value(1) == QVariant("Price")) {
+            *error = "Variable not found";
+            return false;
+        }
+        return true;
+    }
+    std::shared_ptr<AutomationObject> object(const QString&, const QVariantList&, QString*) override
+    {
+        return std::shared_ptr<AutomationObject>(this, [](AutomationObject*) {});
+    }
+    bool setProperty(const QString&, const QVariant&, QString*) override { return true; }
+
+private:
+    QString m_refused;
+};
+} // namespace
+
+class TestLabelRun : public QObject {
+    Q_OBJECT
+    QTemporaryDir work;
+    int runs = 0;
+
+    struct Outcome {
+        LabelRunResult result;
+        QStringList journal;
+    };
+
+    LabelRunRequest request(const LabelData& data, int code, int queryType = 1, const QString& range = " And ItemKey <= 'A2'")
+    {
+        LabelQuerySettings q;
+        q.itemRangeCriteria = range;
+        LabelRunRequest r;
+        r.defaultLabel = kLabel;
+        r.programCode = code;
+        r.dbPath = data.docs;
+        r.sql = BuildItemQuery(q, queryType, 1);
+        r.priceFormat = "0.00";
+        r.fields = {{"ItemKey", "ItemKey", false}, {"Price", "Price", true}};
+        return r;
+    }
+
+    Outcome run(const LabelRunRequest& r, std::shared_ptr<AutomationProvider> provider = {}, bool journal = true)
+    {
+        const QString path = work.filePath(QStringLiteral("journal%1.txt").arg(++runs));
+        AutomationRegistry registry;
+        if (provider)
+            registry.add(LabelProgram::progId(r.programCode), provider);
+        if (journal)
+            registry.setFallback(std::make_shared<JournalProvider>(path));
+        Outcome o{RunLabelProgram(r, registry, nullptr, {}), {}};
+        o.journal = readJournal(path);
+        return o;
+    }
+
+private slots:
+    // Two records of one label file: every program's calls, in order.
+    void callsPerProgram_data()
+    {
+        QTest::addColumn<int>("code");
+        QTest::addColumn<bool>("sheets");
+        QTest::addColumn<QStringList>("calls");
+        const QString n = "NiceLabel.Application.";
+        QTest::newRow("NiceLabel roll") << 5 << false << QStringList{
+            "create NiceLabel.Application", n + "LabelOpen(\"/l/a.lbl\")",
+            n + "LabelSetVar(2, \"ItemKey\", \"A1\", -9999, -9999)", n + "LabelSetVar(2, \"Price\", \"5.00\", -9999, -9999)",
+            n + "LabelPrint(2, \"2,0\")",
+            n + "LabelSetVar(2, \"ItemKey\", \"A2\", -9999, -9999)", n + "LabelSetVar(2, \"Price\", \"1.50\", -9999, -9999)",
+            n + "LabelPrint(2, \"1,0\")", n + "LabelClose(2)", n + "Quit()", "release NiceLabel.Application"};
+        QTest::newRow("NiceLabel sheets") << 5 << true << QStringList{
+            "create NiceLabel.Application", n + "LabelOpen(\"/l/a.lbl\")", n + "LabelSessionStart(2)",
+            n + "LabelSetVar(2, \"ItemKey\", \"A1\", -9999, -9999)", n + "LabelSetVar(2, \"Price\", \"5.00\", -9999, -9999)",
+            n + "LabelSessionPrint(2, \"2,0\")",
+            n + "LabelSetVar(2, \"ItemKey\", \"A2\", -9999, -9999)", n + "LabelSetVar(2, \"Price\", \"1.50\", -9999, -9999)",
+            n + "LabelSessionPrint(2, \"1,0\")", n + "LabelSessionEnd(2)", n + "LabelClose(2)", n + "Quit()",
+            "release NiceLabel.Application"};
+        const QString d = "LPPX.Application.ActiveDocument";
+        QTest::newRow("CodeSoft") << 2 << false << QStringList{
+            "create LPPX.Application", "LPPX.Application.Visible = False", d, d + ".Open(\"/l/a.lbl\")",
+            d + ".Variables(\"ItemKey\")", d + ".Variables(\"ItemKey\").Value = \"A1\"",
+            d + ".Variables(\"Price\")", d + ".Variables(\"Price\").Value = \"5.00\"", d + ".PrintLabel(2)",
+            d + ".Variables(\"ItemKey\")", d + ".Variables(\"ItemKey\").Value = \"A2\"",
+            d + ".Variables(\"Price\")", d + ".Variables(\"Price\").Value = \"1.50\"", d + ".PrintLabel(1)",
+            d + ".FormFeed()", "release LPPX.Application"};
+        const QString f = "BarTender.Application.Formats.Open(\"/l/a.lbl\", False, \"\")";
+        QTest::newRow("BarTender") << 4 << false << QStringList{
+            "create BarTender.Application", "BarTender.Application.Visible = False", "BarTender.Application.Formats", f,
+            f + ".SetNamedSubStringValue(\"ItemKey\", \"A1\")", f + ".SetNamedSubStringValue(\"Price\", \"5.00\")",
+            f + ".IdenticalCopiesOfLabel = 2", f + ".PrintOut(True, False)",
+            f + ".SetNamedSubStringValue(\"ItemKey\", \"A2\")", f + ".SetNamedSubStringValue(\"Price\", \"1.50\")",
+            f + ".IdenticalCopiesOfLabel = 1", f + ".PrintOut(True, False)",
+            "BarTender.Application.Quit(1)", "release BarTender.Application"};
+        const QString x = "FastLabel.FastLabelX.";
+        QTest::newRow("FastLabel") << 7 << false << QStringList{
+            "create FastLabel.FastLabelX", x + "LabelOpen(\"/l/a.lbl\", \"\")",
+            x + "LabelSetVar(\"ItemKey\", \"A1\")", x + "LabelSetVar(\"Price\", \"5.00\")", x + "LabelQty = 2",
+            x + "AddRecord()", x + "LabelSetVar(\"ItemKey\", \"A2\")", x + "LabelSetVar(\"Price\", \"1.50\")",
+            x + "LabelQty = 1", x + "LabelPrint()", "release FastLabel.FastLabelX"};
+    }
+    void callsPerProgram()
+    {
+        QFETCH(int, code);
+        QFETCH(bool, sheets);
+        QFETCH(QStringList, calls);
+        LabelData data;
+        LabelRunRequest r = request(data, code);
+        r.sheets = sheets;
+        const Outcome o = run(r);
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
+        QCOMPARE(o.journal, calls);
+    }
+
+    // The id a program hands back from its open call is the one used after it.
+    void labelIdFollowsOpen()
+    {
+        LabelData data;
+        const QString path = work.filePath("ids.txt");
+        QFile::remove(path);
+        QFile pre(path);
+        QVERIFY(pre.open(QIODevice::WriteOnly));
+        pre.write("an earlier run\nand another\n");
+        pre.close();
+        AutomationRegistry registry;
+        registry.setFallback(std::make_shared<JournalProvider>(path));
+        QCOMPARE(int(RunLabelProgram(request(data, 5), registry, nullptr, {}).status), int(LabelRunResult::Status::Done));
+        const QStringList lines = readJournal(path, true);
+        QCOMPARE(lines[3], QString("NiceLabel.Application.LabelOpen(\"/l/a.lbl\") -> 4"));
+        QVERIFY(lines[4].startsWith("NiceLabel.Application.LabelSetVar(4, "));
+    }
+
+    // Per-account labels, with the second label for long values, by documents.
+    void accountLabels_data()
+    {
+        QTest::addColumn<int>("fieldId");
+        QTest::addColumn<QStringList>("opened");
+        QTest::newRow("second label by barcode length") << 2 << QStringList{"/l/own.lbl", "/l/long.lbl", kLabel};
+        QTest::newRow("no field: always the account's") << 0 << QStringList{"/l/own.lbl", kLabel};
+    }
+    void accountLabels()
+    {
+        QFETCH(int, fieldId);
+        QFETCH(QStringList, opened);
+        LabelData data(QStringLiteral("UPDATE tAccountDef SET LabelName = '/l/own.lbl', FldID = %1, FldMaxLen = 13,"
+                                      " Label2Name = '/l/long.lbl'").arg(fieldId));
+        const Outcome o = run(request(data, 5, 2, {}));
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
+        QStringList opens, closes;
+        for (const QString& l : o.journal) {
+            if (l.contains(".LabelOpen("))
+                opens << l.section('"', 1, 1);
+            if (l.contains(".LabelClose("))
+                closes << l;
+        }
+        QCOMPARE(opens, opened);
+        // Each change of file closes the old one first; the last is closed at the end.
+        QCOMPARE(closes.size(), opened.size());
+        QVERIFY(o.journal.indexOf(QRegularExpression(".*LabelClose.*")) < o.journal.lastIndexOf(QRegularExpression(".*LabelOpen.*")));
+    }
+
+    void headerLabelPerDocument()
+    {
+        LabelData data;
+        LabelRunRequest r = request(data, 5, 2, {});
+        r.printHeader = true;
+        r.headerLabel = "/l/head.lbl";
+        const Outcome o = run(r);
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
+        QStringList events;
+        for (const QString& l : o.journal) {
+            if (l.contains("LabelOpen("))
+                events << "open " + l.section('"', 1, 1);
+            else if (l.contains("LabelPrint("))
+                events << "print " + l.section('"', 1, 1);
+        }
+        QCOMPARE(events, QStringList({"open /l/head.lbl", "print 1,0", "open /l/a.lbl", "print 4,0", "print 1,0",
+                                      "open /l/head.lbl", "print 1,0", "open /l/a.lbl", "print 2,0"}));
+    }
+
+    // FastLabel collects the records of a file and prints them once.
+    void fastLabelCollects()
+    {
+        LabelData data;
+        const Outcome o = run(request(data, 7, 1, {}));
+        QCOMPARE(o.journal.filter("LabelOpen(").size(), 1);
+        QCOMPARE(o.journal.filter("AddRecord(").size(), 2);
+        QCOMPARE(o.journal.filter("LabelQty = ").size(), 3);
+        QCOMPARE(o.journal.filter("LabelPrint(").size(), 1);
+        QVERIFY(o.journal.at(o.journal.size() - 2).endsWith("LabelPrint()"));
+    }
+
+    void nullSentAsEmptyText()
+    {
+        LabelData data;
+        LabelRunRequest r = request(data, 7, 1, " And ItemKey = 'B1'");
+        r.fields = {{"BarCode", "BarCode", false}, {"AltItemPrice", "Price", true}};
+        const Outcome o = run(r);
+        QVERIFY(o.journal.contains("FastLabel.FastLabelX.LabelSetVar(\"BarCode\", \"\")"));
+        QVERIFY(o.journal.contains("FastLabel.FastLabelX.LabelSetVar(\"AltItemPrice\", \"0.25\")"));
+    }
+
+    void failures_data()
+    {
+        QTest::addColumn<int>("code");
+        QTest::addColumn<QString>("delay");
+        QTest::addColumn<bool>("journal");
+        QTest::addColumn<QString>("refused");
+        QTest::addColumn<QString>("tail");
+        QTest::newRow("delay not a number") << 5 << "abc" << true << "" << " In Line 0, LabelID = 0, Var = , Value = ";
+        QTest::newRow("no provider") << 5 << "" << false << "" << " In Line 2, LabelID = 0, Var = , Value = ";
+        QTest::newRow("no program for the code") << 6 << "" << true << "" << " In Line 2, LabelID = 0, Var = , Value = ";
+        QTest::newRow("a call refused") << 5 << "" << false << "LabelSetVar" << " In Line 7, LabelID = 42, Var = Price, Value = 5.00";
+    }
+    void failures()
+    {
+        QFETCH(int, code);
+        QFETCH(QString, delay);
+        QFETCH(bool, journal);
+        QFETCH(QString, refused);
+        QFETCH(QString, tail);
+        LabelData data;
+        LabelRunRequest r = request(data, code);
+        r.delayText = delay;
+        std::shared_ptr<AutomationProvider> provider;
+        if (!refused.isEmpty())
+            provider = std::make_shared<RefusingProvider>(refused);
+        const Outcome o = run(r, provider, journal);
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Failed));
+        QVERIFY2(o.result.message.endsWith(tail), qPrintable(o.result.message));
+        QVERIFY(o.result.message.length() > tail.length());
+        if (delay == "abc")
+            QVERIFY(o.journal.isEmpty());
+    }
+
+    void noRecordsCreatesNothing()
+    {
+        LabelData data;
+        const Outcome o = run(request(data, 5, 1, " And ItemKey = 'none'"));
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::NoRecords));
+        QVERIFY(o.journal.isEmpty());
+    }
+
+    // Runs of any length: a count kept in 16 bits would stop at 32,768.
+    void longRun()
+    {
+        LabelData data("WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < 32800)"
+                       " INSERT INTO tItems (ItemKey, Copies, PrintLabel) SELECT printf('Z%05d', i), 1, 1 FROM n");
+        LabelRunRequest r = request(data, 7, 1, " And ItemKey >= 'Z'");
+        r.fields = {{"ItemKey", "ItemKey", false}};
+        const Outcome o = run(r);
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
+        QCOMPARE(o.journal.filter("LabelQty = ").size(), 32800);
+        QVERIFY(o.journal.contains("FastLabel.FastLabelX.LabelSetVar(\"ItemKey\", \"Z32800\")"));
+    }
+
+    void waitCountsSecondBoundaries()
+    {
+        QElapsedTimer t;
+        t.start();
+        WaitSeconds(1);
+        const qint64 ms = t.elapsed();
+        // One boundary passed: somewhere within the next second, never more than one.
+        QVERIFY(ms <= 1100);
+        WaitSeconds(0);
+    }
+
+    // The print button, with the order of the printer type.
+    void printButton_data()
+    {
+        QTest::addColumn<bool>("roll");
+        QTest::addColumn<QStringList>("keys");
+        QTest::newRow("roll prints last to first") << true << QStringList{"B1", "A2", "A1"};
+        QTest::newRow("sheets first to last") << false << QStringList{"A1", "A2", "B1"};
+    }
+    void printButton()
+    {
+        QFETCH(bool, roll);
+        QFETCH(QStringList, keys);
+        LabelData data;
+        const QString journal = work.filePath(QStringLiteral("button%1.txt").arg(++runs));
+        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n").arg(journal, data.folder).toUtf8());
+        f.c<QRadioButton>(roll ? "OptPrinter(1)" : "OptPrinter(0)")->setChecked(true);
+        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
+        f.c<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
+        QCOMPARE(f.card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        QStringList sent;
+        for (const QString& l : readJournal(journal).filter("\"ItemKey\""))
+            sent << l.section('"', 3, 3);
+        QCOMPARE(sent, keys);
+    }
+};
+
+QTEST_MAIN(TestLabelRun)
+#include "tst_labelrun.moc"
