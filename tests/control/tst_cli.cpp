@@ -187,8 +187,9 @@ private slots:
     {
         const Run r = runCli(settings(), {"call", "RunOLE", "x.lbl", "1", "1", "5", "/tmp/none.tmp", "false", "get",
                                           "txtCopies"});
-        QCOMPARE(r.exitCode, 0);
-        QCOMPARE(r.out.last(), QString("1"));
+        // The run fails on the missing database (a critical box, result 0); the next verb still runs.
+        QCOMPARE(r.exitCode, 1);
+        QCOMPARE(r.out.mid(r.out.size() - 2), QStringList({"0", "1"}));
     }
 };
 
