@@ -343,19 +343,23 @@ private slots:
     {
         QTest::addColumn<QString>("button");
         QTest::addColumn<bool>("created");
-        QTest::newRow("by items") << "cmdPrintItmes" << true;
-        QTest::newRow("by documents") << "cmdPrintDocButt" << false;
+        QTest::addColumn<QString>("shown");
+        // Nothing is marked in a new folder; by documents there is nothing to read at all.
+        QTest::newRow("by items") << "cmdPrintItmes" << true << QString::fromUtf8("תקלה: לא נבחרו פריטים להדפסה");
+        QTest::newRow("by documents") << "cmdPrintDocButt" << false << QString::fromUtf8("תקלה במשלוח נתונים להדפסה: ");
     }
     void printPreparesDataFolder()
     {
         QFETCH(QString, button);
         QFETCH(bool, created);
+        QFETCH(QString, shown);
         CardFixture f;
         const QString data = f.dir.filePath("fresh");
         f.c<QLineEdit>("txtDBPath")->setText(data);
         f.c<QPushButton>(button)->click();
         QCOMPARE(QFile::exists(data + "/" + dbfiles::TempDocs), created);
-        QVERIFY(f.prompt->lines().isEmpty());
+        QCOMPARE(f.prompt->lines().size(), 1);
+        QVERIFY2(f.prompt->lines().first().startsWith(shown), qPrintable(f.prompt->lines().first()));
         if (!created)
             return;
         Database db;
