@@ -9,6 +9,7 @@ PACKAGES=(
   libsqlite3-dev sqlite3
   unixodbc unixodbc-dev libsqliteodbc odbc-postgresql postgresql
   fonts-dejavu-core
+  libzint-dev zbar-tools
 )
 
 missing=()

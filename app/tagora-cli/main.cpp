@@ -1,7 +1,7 @@
 // The headless host: creates the control without a screen, runs its creation
 // and show steps, then a sequence of verbs in that one instance:
 //   set NAME VALUE | get NAME | click NAME | dblclick NAME | call METHOD [ARG...]
-//   additem NAME TEXT | grab FILE
+//   additem NAME TEXT | grab FILE | setcell GRID ROW COL VALUE | getcell GRID ROW COL
 // Options: --settings FILE, --answer yes|no, --file PATH, --script FILE|-,
 //   --demo DIR (with --demo-items N, --demo-type 1|2 before it).
 // A dialog that a command opens takes the verbs that follow until one of them
@@ -15,6 +15,7 @@
 #include "control/settingstable.h"
 #include "erp/demosetup.h"
 
+#include <QAbstractItemView>
 #include <QApplication>
 #include <QComboBox>
 #include <QDialog>
@@ -27,7 +28,7 @@ namespace {
 
 using namespace tagora;
 
-const QStringList kVerbs = {"set", "get", "click", "dblclick", "call", "additem", "grab"};
+const QStringList kVerbs = {"set", "get", "click", "dblclick", "call", "additem", "grab", "setcell", "getcell"};
 
 void out(const QString& text)
 {
@@ -150,7 +151,8 @@ private:
             err(why);
         err(QStringLiteral("usage: tagora-cli [--settings FILE] [--answer yes|no] [--file PATH] [--script FILE|-] "
                            "[--demo-items N] [--demo-type 1|2] [--demo DIR] [set NAME VALUE | get NAME | click NAME | "
-                           "dblclick NAME | call METHOD [ARG...] | additem NAME TEXT | grab FILE]..."));
+                           "dblclick NAME | call METHOD [ARG...] | additem NAME TEXT | grab FILE | "
+                           "setcell GRID ROW COL VALUE | getcell GRID ROW COL]..."));
         m_failed = true;
     }
 
@@ -368,6 +370,33 @@ private:
             if (!combo)
                 return fail(QStringLiteral("%1 is not a list").arg(name));
             combo->addItem(text);
+        } else if (t == QLatin1String("setcell") || t == QLatin1String("getcell")) {
+            // Grid rows count as the grid shows them: row 0 is the header, data from 1.
+            const bool write = t == QLatin1String("setcell");
+            if (!has(write ? 4 : 3))
+                return usage();
+            const QString name = take();
+            bool rowOk = false, colOk = false;
+            const int row = take().toInt(&rowOk);
+            const int col = take().toInt(&colOk);
+            const QString value = write ? take() : QString();
+            auto* view = qobject_cast<QAbstractItemView*>(find(name));
+            QAbstractItemModel* model = view ? view->model() : nullptr;
+            if (!model)
+                return fail(QStringLiteral("%1 is not a grid").arg(name));
+            const QModelIndex index = model->index(row - 1, col);
+            if (!rowOk || !colOk || !index.isValid())
+                return fail(QStringLiteral("%1 has no cell %2, %3").arg(name).arg(row).arg(col));
+            const bool check = model->flags(index).testFlag(Qt::ItemIsUserCheckable);
+            if (!write) {
+                out(check ? QString::number(model->data(index, Qt::CheckStateRole).toInt() == Qt::Checked ? 1 : 0)
+                          : model->data(index, Qt::DisplayRole).toString());
+                return;
+            }
+            const bool ok = check ? model->setData(index, value.toInt() != 0 ? Qt::Checked : Qt::Unchecked, Qt::CheckStateRole)
+                                  : model->setData(index, value, Qt::EditRole);
+            if (!ok)
+                return fail(QStringLiteral("%1 refused the value '%2' in cell %3, %4").arg(name, value).arg(row).arg(col));
         } else if (t == QLatin1String("grab")) {
             if (!has(1))
                 return usage();

@@ -10,6 +10,7 @@
 #include "control/settingsstore.h"
 #include "control/settingstable.h"
 #include "labels/labelfields.h"
+#include "dialogs/frmselectitem.h"
 #include "labels/itemquery.h"
 #include "localdb/schema.h"
 
@@ -533,7 +534,8 @@ void MainCard::cmdSelectItems_Click()
     m_shared.itemRangeCriteria = itemRangeCriteria();
     m_shared.itemTextRtl = ui->chkItmRTL->isChecked();
     m_shared.objectRef = this;
-    showDialog(QStringLiteral("frmSelectItem"));
+    FrmSelectItem dialog(m_shared.dataFolder, m_shared.itemRangeCriteria, this, this);
+    runDialog(dialog);
 }
 
 void MainCard::cmdSelectDocItems_Click()

@@ -120,6 +120,9 @@ public:
     // Item range criteria of the labels-by-items tab: " And ItemKey >= '..'" and so on.
     QString itemRangeCriteria() const;
 
+    // Opens the card of an item: from the ERP, or from the local databases.
+    void showItemCard(const QString& itemKey, bool fromErp);
+
 signals:
     // Every change of the status line text.
     void messageChanged(const QString& text);

@@ -63,4 +63,6 @@ void MainCard::PrintFromLabelList() {}
 
 void MainCard::showDialog(const QString&) {}
 
+void MainCard::showItemCard(const QString&, bool) {}
+
 } // namespace tagora

@@ -109,9 +109,10 @@ const std::vector<std::pair<const char*, const char*>>& tempDocsQueries()
 const std::vector<std::pair<const char*, const char*>>& itemsQueries()
 {
     static const std::vector<std::pair<const char*, const char*>> q = {
-        {"qSelectItems", "SELECT ItemKey, ItemName, Copies, PrintLabel FROM tItems ORDER BY tItems.PrintLabel, tItems.Itemkey"},
+        // Marked items first: true is 1 here, so the mark sorts descending.
+        {"qSelectItems", "SELECT ItemKey, ItemName, Copies, PrintLabel FROM tItems ORDER BY tItems.PrintLabel DESC, tItems.Itemkey"},
         {"qSelectMarkedItems", "SELECT ItemKey, ItemName, Copies, PrintLabel FROM tItems Where PrintLabel = True"
-                               " ORDER BY tItems.PrintLabel, tItems.Itemkey"},
+                               " ORDER BY tItems.PrintLabel DESC, tItems.Itemkey"},
         {"qEditItems", "SELECT ItemKey, ItemName, Unit, BarCode, Price FROM tItems ORDER BY tItems.Itemkey"},
     };
     return q;

@@ -182,6 +182,49 @@ private slots:
         QVERIFY(QFile::exists(demo + "/data/tgrmitm.tdb"));
     }
 
+    // The whole road by items, scripted: import, select (find, mark, copies), print.
+    void scriptedSelectionPrints()
+    {
+        const QString odbc = dir.filePath("odbc2");
+        QDir().mkpath(odbc);
+        QFile::copy("/etc/odbcinst.ini", odbc + "/odbcinst.ini");
+        const QList<std::pair<QString, QString>> env = {{"ODBCSYSINI", odbc}, {"ODBCINI", odbc + "/user.ini"}};
+        const QString journal = dir.filePath("journal.txt");
+        {
+            QFile f(settings());
+            QVERIFY(f.open(QIODevice::WriteOnly));
+            f.write(QStringLiteral("[Automation]\nJournalFile=%1\n").arg(journal).toUtf8());
+        }
+        const QByteArray script = "set cmbPriceField 1\n"
+                                  "click CmdImportItems\n"
+                                  "set \"ChkFldSend(0)\" 1\n"
+                                  "click cmdSelectItems\n"
+                                  "  set txtToItemkey \"O'R-5\"\n"
+                                  "  click cmdFindKey\n"
+                                  "  set txtToItemkey \"AB'12\"\n"
+                                  "  click cmdFindKey\n"
+                                  "  set txtAllCopis 3\n"
+                                  "  click CmdAllCopies\n"
+                                  "  click cmdShowMarked\n"
+                                  "  getcell VSSelectItems 1 1\n"
+                                  "  setcell VSSelectItems 1 3 5\n"
+                                  "  click cmdClose\n"
+                                  "click cmdPrintItmes\n";
+        const Run r = runCli(settings(), {"--demo", dir.filePath("demo2"), "--script", "-"}, script, env);
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        QVERIFY(r.out.contains("AB'12"));
+        QCOMPARE(r.out.last(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        QFile f(journal);
+        QVERIFY(f.open(QIODevice::ReadOnly));
+        QStringList sent;
+        for (const QString& line : QString::fromUtf8(f.readAll()).split('\n'))
+            if (line.contains("LabelSetVar(") || line.contains("LabelPrint("))
+                sent << line.section('(', 1).section(')', 0, 0);
+        // A roll printer: last key first, each with its copies.
+        QCOMPARE(sent, QStringList({"2, \"ItemKey\", \"O'R-5\", -9999, -9999", "2, \"3,0\"",
+                                    "2, \"ItemKey\", \"AB'12\", -9999, -9999", "2, \"5,0\""}));
+    }
+
     // A method with an optional last parameter stops taking arguments at the next verb.
     void optionalArgumentsStopAtVerb()
     {

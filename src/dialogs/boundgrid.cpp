@@ -1,0 +1,316 @@
+#include "dialogs/boundgrid.h"
+
+#include "localdb/database.h"
+
+#include <QComboBox>
+#include <QHeaderView>
+
+#include <cmath>
+
+namespace tagora {
+
+BoundTableModel::BoundTableModel(QObject* parent)
+    : QAbstractTableModel(parent)
+{
+}
+
+void BoundTableModel::setSource(const QString& dbPath, const QString& baseTable, const QStringList& keyFields,
+                                const QVector<BoundColumn>& columns)
+{
+    beginResetModel();
+    m_dbPath = dbPath;
+    m_base = baseTable;
+    m_keys = keyFields;
+    m_columns = columns;
+    m_rows.clear();
+    m_fields.clear();
+    endResetModel();
+}
+
+bool BoundTableModel::setQuery(const QString& sql)
+{
+    m_sql = sql;
+    return refresh();
+}
+
+bool BoundTableModel::refresh()
+{
+    Database db;
+    DbError e = db.open(m_dbPath);
+    Statement s;
+    if (!e)
+        s = db.prepare(m_sql, &e);
+    if (e) {
+        m_error = e.message;
+        return false;
+    }
+    QStringList fields;
+    for (int i = 0; i < s.columnCount(); ++i)
+        fields << s.columnName(i);
+    QVector<QVector<QVariant>> rows;
+    Statement::Step st;
+    while ((st = s.step()) == Statement::Step::Row) {
+        QVector<QVariant> r(fields.size());
+        for (int i = 0; i < fields.size(); ++i)
+            r[i] = s.value(i);
+        rows.push_back(std::move(r));
+    }
+    if (st == Statement::Step::Error) {
+        m_error = s.error().message;
+        return false;
+    }
+    beginResetModel();
+    m_fields = fields;
+    m_rows = std::move(rows);
+    m_error.clear();
+    endResetModel();
+    return true;
+}
+
+int BoundTableModel::fieldIndex(const QString& field) const
+{
+    for (int i = 0; i < m_fields.size(); ++i)
+        if (m_fields[i].compare(field, Qt::CaseInsensitive) == 0)
+            return i;
+    return -1;
+}
+
+QVariant BoundTableModel::value(int row, const QString& field) const
+{
+    const int f = fieldIndex(field);
+    if (row < 0 || row >= m_rows.size() || f < 0)
+        return QVariant();
+    return m_rows[row][f];
+}
+
+int BoundTableModel::rowCount(const QModelIndex& parent) const
+{
+    return parent.isValid() ? 0 : int(m_rows.size());
+}
+
+int BoundTableModel::columnCount(const QModelIndex& parent) const
+{
+    return parent.isValid() ? 0 : int(m_columns.size());
+}
+
+QString BoundTableModel::choiceText(const BoundColumn& c, const QVariant& v) const
+{
+    for (const auto& [stored, shown] : c.choices)
+        if (stored.toString() == v.toString())
+            return shown;
+    return v.toString();
+}
+
+QVariant BoundTableModel::data(const QModelIndex& index, int role) const
+{
+    if (!index.isValid() || index.row() >= m_rows.size() || index.column() >= m_columns.size())
+        return QVariant();
+    const BoundColumn& c = m_columns[index.column()];
+    const QVariant v = c.field.isEmpty() ? QVariant() : value(index.row(), c.field);
+    switch (role) {
+    case Qt::DisplayRole:
+        if (c.kind == BoundColumn::Kind::Check || c.kind == BoundColumn::Kind::Picture)
+            return QVariant();
+        if (c.kind == BoundColumn::Kind::Button)
+            return c.buttonText;
+        if (c.kind == BoundColumn::Kind::Choice)
+            return choiceText(c, v);
+        return v.isNull() ? QVariant(QString()) : v;
+    case Qt::EditRole:
+        return v;
+    case Qt::CheckStateRole:
+        if (c.kind != BoundColumn::Kind::Check)
+            return QVariant();
+        return v.toLongLong() != 0 ? Qt::Checked : Qt::Unchecked;
+    case Qt::DecorationRole:
+        if (c.kind == BoundColumn::Kind::Picture || c.kind == BoundColumn::Kind::Button)
+            return c.icon.isNull() ? QVariant() : QVariant(c.icon);
+        return QVariant();
+    case Qt::TextAlignmentRole:
+        return QVariant::fromValue(c.alignment);
+    default:
+        return QVariant();
+    }
+}
+
+Qt::ItemFlags BoundTableModel::flags(const QModelIndex& index) const
+{
+    if (!index.isValid())
+        return Qt::NoItemFlags;
+    Qt::ItemFlags f = Qt::ItemIsEnabled | Qt::ItemIsSelectable;
+    const BoundColumn& c = m_columns[index.column()];
+    if (c.editable) {
+        if (c.kind == BoundColumn::Kind::Check)
+            f |= Qt::ItemIsUserCheckable;
+        else if (c.kind != BoundColumn::Kind::Picture && c.kind != BoundColumn::Kind::Button)
+            f |= Qt::ItemIsEditable;
+    }
+    return f;
+}
+
+bool BoundTableModel::setData(const QModelIndex& index, const QVariant& value, int role)
+{
+    if (!index.isValid() || index.row() >= m_rows.size())
+        return false;
+    const BoundColumn& c = m_columns[index.column()];
+    if (!c.editable || c.field.isEmpty())
+        return false;
+    QVariant stored;
+    if (c.kind == BoundColumn::Kind::Check) {
+        if (role != Qt::CheckStateRole && role != Qt::EditRole)
+            return false;
+        const bool on = role == Qt::CheckStateRole ? value.toInt() == Qt::Checked : value.toBool();
+        stored = on ? 1 : 0;
+    } else {
+        if (role != Qt::EditRole)
+            return false;
+        stored = value;
+        if (c.kind == BoundColumn::Kind::Number) {
+            bool ok = false;
+            const double d = value.toString().trimmed().toDouble(&ok);
+            // A number that does not read as one is stored as 0, not refused.
+            stored = ok ? QVariant(qlonglong(std::llround(d))) : QVariant(qlonglong(0));
+        }
+    }
+    return setField({index.row()}, c.field, stored);
+}
+
+bool BoundTableModel::setField(const QVector<int>& rows, const QString& field, const QVariant& value)
+{
+    const int f = fieldIndex(field);
+    if (f < 0 || rows.isEmpty())
+        return false;
+    QStringList where;
+    for (int k = 0; k < m_keys.size(); ++k)
+        where << QStringLiteral("\"%1\" = ?%2").arg(m_keys[k]).arg(k + 2);
+    Database db;
+    DbError e = db.open(m_dbPath);
+    if (!e) {
+        Transaction tx(db);
+        Statement update = db.prepare(QStringLiteral("UPDATE \"%1\" SET \"%2\" = ?1 WHERE %3")
+                                          .arg(m_base, m_fields[f], where.join(QStringLiteral(" AND "))),
+                                      &e);
+        for (int row : rows) {
+            if (e)
+                break;
+            update.bind(1, value);
+            for (int k = 0; k < m_keys.size(); ++k)
+                update.bind(k + 2, this->value(row, m_keys[k]));
+            e = update.run();
+        }
+        if (!e)
+            e = tx.commit();
+    }
+    if (e) {
+        m_error = e.message;
+        emit writeFailed(e.message);
+        return false;
+    }
+    for (int row : rows) {
+        m_rows[row][f] = value;
+        for (int col = 0; col < m_columns.size(); ++col)
+            if (m_columns[col].field.compare(field, Qt::CaseInsensitive) == 0)
+                emit dataChanged(index(row, col), index(row, col));
+    }
+    return true;
+}
+
+QVariant BoundTableModel::headerData(int section, Qt::Orientation orientation, int role) const
+{
+    if (orientation == Qt::Horizontal && role == Qt::DisplayRole && section >= 0 && section < m_columns.size())
+        return m_columns[section].header;
+    return QAbstractTableModel::headerData(section, orientation, role);
+}
+
+// ------------------------------------------------------------------ the grid
+
+BoundGrid::BoundGrid(QWidget* parent)
+    : QTableView(parent)
+{
+    setLayoutDirection(Qt::RightToLeft);
+    setSelectionBehavior(QAbstractItemView::SelectRows);
+    setSelectionMode(QAbstractItemView::ExtendedSelection);
+    setEditTriggers(QAbstractItemView::DoubleClicked | QAbstractItemView::EditKeyPressed
+                    | QAbstractItemView::AnyKeyPressed | QAbstractItemView::SelectedClicked);
+    verticalHeader()->setVisible(false);
+    verticalHeader()->setDefaultSectionSize(22);
+    horizontalHeader()->setStretchLastSection(true);
+    connect(this, &QAbstractItemView::clicked, this, [this](const QModelIndex& index) {
+        if (!m_model || !index.isValid())
+            return;
+        const auto kind = m_model->columns()[index.column()].kind;
+        if (kind == BoundColumn::Kind::Picture || kind == BoundColumn::Kind::Button)
+            emit cellActivated(index.row(), index.column());
+    });
+}
+
+void BoundGrid::setBoundModel(BoundTableModel* model)
+{
+    m_model = model;
+    setModel(model);
+    for (int c = 0; c < model->columns().size(); ++c)
+        if (model->columns()[c].kind == BoundColumn::Kind::Choice)
+            setItemDelegateForColumn(c, new ChoiceDelegate(this));
+    connect(model, &QAbstractItemModel::modelReset, this, &BoundGrid::sizeColumns);
+}
+
+int BoundGrid::currentRowIndex() const
+{
+    return currentIndex().isValid() ? currentIndex().row() : -1;
+}
+
+void BoundGrid::setCurrentRowIndex(int row, int column)
+{
+    if (!m_model || row < 0 || row >= m_model->rowCount())
+        return;
+    const QModelIndex i = m_model->index(row, std::min(column, m_model->columnCount() - 1));
+    setCurrentIndex(i);
+    scrollTo(i);
+}
+
+void BoundGrid::sizeColumns()
+{
+    if (!m_model)
+        return;
+    for (int c = 0; c < m_model->columnCount(); ++c) {
+        if (m_model->columns()[c].kind == BoundColumn::Kind::Picture)
+            setColumnWidth(c, 24);
+        else
+            resizeColumnToContents(c);
+    }
+}
+
+QString BoundGrid::text(int row, int column) const
+{
+    if (!m_model || row < 0 || row >= m_model->rowCount() || column < 0 || column >= m_model->columnCount())
+        return QString();
+    const QModelIndex i = m_model->index(row, column);
+    if (m_model->columns()[column].kind == BoundColumn::Kind::Check)
+        return m_model->data(i, Qt::CheckStateRole).toInt() == Qt::Checked ? QStringLiteral("1") : QStringLiteral("0");
+    return m_model->data(i, Qt::DisplayRole).toString();
+}
+
+QWidget* ChoiceDelegate::createEditor(QWidget* parent, const QStyleOptionViewItem&, const QModelIndex& index) const
+{
+    auto* model = qobject_cast<const BoundTableModel*>(index.model());
+    auto* box = new QComboBox(parent);
+    if (model)
+        for (const auto& [stored, shown] : model->columns()[index.column()].choices)
+            box->addItem(shown, stored);
+    return box;
+}
+
+void ChoiceDelegate::setEditorData(QWidget* editor, const QModelIndex& index) const
+{
+    auto* box = static_cast<QComboBox*>(editor);
+    box->setCurrentIndex(box->findData(index.data(Qt::EditRole)));
+}
+
+void ChoiceDelegate::setModelData(QWidget* editor, QAbstractItemModel* model, const QModelIndex& index) const
+{
+    auto* box = static_cast<QComboBox*>(editor);
+    if (box->currentIndex() >= 0)
+        model->setData(index, box->currentData(), Qt::EditRole);
+}
+
+} // namespace tagora

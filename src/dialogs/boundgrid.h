@@ -1,0 +1,122 @@
+#pragma once
+
+#include <QAbstractTableModel>
+#include <QIcon>
+#include <QStyledItemDelegate>
+#include <QTableView>
+#include <QVariant>
+#include <QVector>
+
+namespace tagora {
+
+// One column of a bound grid: which field of the query it shows and how.
+struct BoundColumn {
+    enum class Kind { Text, Number, Check, Picture, Choice, Button };
+    QString field;  // the query's column; empty for a picture or button column
+    QString header;
+    Kind kind = Kind::Text;
+    bool editable = false;
+    Qt::Alignment alignment = Qt::AlignRight | Qt::AlignVCenter;
+    QVector<QPair<QVariant, QString>> choices; // Choice: stored value and the text shown for it
+    QIcon icon;                                // Picture and Button
+    QString buttonText;                        // Button
+};
+
+inline BoundColumn boundColumn(const QString& field, const QString& header, BoundColumn::Kind kind,
+                               bool editable = false, Qt::Alignment alignment = Qt::AlignRight | Qt::AlignVCenter)
+{
+    BoundColumn c;
+    c.field = field;
+    c.header = header;
+    c.kind = kind;
+    c.editable = editable;
+    c.alignment = alignment;
+    return c;
+}
+
+// The rows of a query over a local database file, with every edit written to
+// its base table at once (found by the key fields, which the query selects).
+// Nothing here shows anything: a failed write leaves the row as it was and is
+// reported through writeFailed.
+class BoundTableModel : public QAbstractTableModel {
+    Q_OBJECT
+public:
+    explicit BoundTableModel(QObject* parent = nullptr);
+
+    void setSource(const QString& dbPath, const QString& baseTable, const QStringList& keyFields,
+                   const QVector<BoundColumn>& columns);
+    // Runs the query and shows its rows; false (with lastError) when it failed,
+    // leaving the rows shown before.
+    bool setQuery(const QString& sql);
+    bool refresh();
+    QString query() const { return m_sql; }
+    QString lastError() const { return m_error; }
+
+    const QVector<BoundColumn>& columns() const { return m_columns; }
+    QVariant value(int row, const QString& field) const;
+    // Writes one field of many rows in one transaction; false when it failed
+    // (nothing written then).
+    bool setField(const QVector<int>& rows, const QString& field, const QVariant& value);
+
+    int rowCount(const QModelIndex& parent = QModelIndex()) const override;
+    int columnCount(const QModelIndex& parent = QModelIndex()) const override;
+    QVariant data(const QModelIndex& index, int role = Qt::DisplayRole) const override;
+    bool setData(const QModelIndex& index, const QVariant& value, int role = Qt::EditRole) override;
+    Qt::ItemFlags flags(const QModelIndex& index) const override;
+    QVariant headerData(int section, Qt::Orientation orientation, int role = Qt::DisplayRole) const override;
+
+signals:
+    void writeFailed(const QString& message);
+
+private:
+    int fieldIndex(const QString& field) const;
+    QString choiceText(const BoundColumn& c, const QVariant& v) const;
+
+    QString m_dbPath;
+    QString m_base;
+    QStringList m_keys;
+    QVector<BoundColumn> m_columns;
+    QString m_sql;
+    QStringList m_fields;              // the query's columns
+    QVector<QVector<QVariant>> m_rows; // values by query column
+    QString m_error;
+};
+
+// The grid a bound model is shown in: check boxes, typed numbers, lists of
+// values with shown texts, a picture or button column, a current row, and
+// several rows selected at once. Right to left like the screens it sits on.
+class BoundGrid : public QTableView {
+    Q_OBJECT
+public:
+    explicit BoundGrid(QWidget* parent = nullptr);
+
+    void setBoundModel(BoundTableModel* model);
+    BoundTableModel* boundModel() const { return m_model; }
+
+    int currentRowIndex() const;
+    void setCurrentRowIndex(int row, int column = 1);
+    void sizeColumns();
+    // The cell's text as the grid shows it.
+    QString text(int row, int column) const;
+
+signals:
+    // A click on a picture or button cell.
+    void cellActivated(int row, int column);
+
+private:
+    BoundTableModel* m_model = nullptr;
+};
+
+// Edits a Choice column with a list of the shown texts.
+class ChoiceDelegate : public QStyledItemDelegate {
+    Q_OBJECT
+public:
+    using QStyledItemDelegate::QStyledItemDelegate;
+    QWidget* createEditor(QWidget* parent, const QStyleOptionViewItem&, const QModelIndex& index) const override;
+    void setEditorData(QWidget* editor, const QModelIndex& index) const override;
+    void setModelData(QWidget* editor, QAbstractItemModel* model, const QModelIndex& index) const override;
+};
+
+} // namespace tagora
+
+using tagora::BoundGrid;

@@ -1,0 +1,436 @@
+#include "labels/barcode.h"
+
+#include <QDir>
+#include <QFile>
+#include <QFileInfo>
+#include <QTemporaryDir>
+
+#include <cmath>
+#include <zint.h>
+
+// How the library's settings reach libzint.
+//
+// | library code | symbology              | zint symbology                   | CheckDigit                     | data accepted                         |
+// |--------------|------------------------|----------------------------------|--------------------------------|---------------------------------------|
+// | 0            | Code 39                | BARCODE_CODE39                   | mod-43 character (option_2 1)  | 0-9 A-Z space - . $ / + %             |
+// | 0 + C39Ascii | Code 39 full ASCII     | BARCODE_EXCODE39                 | mod-43 character (option_2 1)  | ASCII 0-127                           |
+// | 1            | Code 128, automatic    | BARCODE_CODE128                  | none (mod 103 always present)  | Latin-1                               |
+// | 14           | Code 128 subset A      | BARCODE_CODE128B (no subset C)   | none (mod 103 always present)  | U+0000-U+005F (subset A's characters) |
+// | 15           | Code 128 subset B      | BARCODE_CODE128B (no subset C)   | none (mod 103 always present)  | U+0020-U+007F (subset B's characters) |
+// | 9            | EAN-8                  | BARCODE_EANX / BARCODE_EANX_CHK  | on: 7 digits get one added;    | 7 digits (check on) or 8 digits       |
+// |              |                        |                                  | 8 digits: the last is verified |                                       |
+// | 10           | EAN-13                 | BARCODE_EANX / BARCODE_EANX_CHK  | as EAN-8, with 12 and 13       | 12 digits (check on) or 13 digits     |
+// | 4            | Interleaved 2 of 5     | BARCODE_C25INTER                 | mod-10 digit (option_2 1)      | digits, an even count with the check  |
+// | other        | -                      | -                                | -                              | refused at output                     |
+//
+// | setting          | zint                                                                                   |
+// |------------------|----------------------------------------------------------------------------------------|
+// | Unit             | only 0 = inches; any other unit is refused at output                                   |
+// | DimX, UserResoX  | module of round(DimX * resolution) pixels, at least 1: scale = pixels / 2              |
+// |                  | (zint's raster draws 2 pixels per module at scale 1)                                   |
+// | BarHeight, ResoY | height = BarHeight * resolution / module pixels (zint counts height in modules);       |
+// |                  | 0 or less leaves zint's own default (50 modules); the text is drawn below, extra       |
+// | resolution <= 0  | 200 dots per inch                                                                      |
+// | ShowDesc         | show_hrt; zint draws no text when a module is 1 pixel                                  |
+// | Data             | UTF-8 with input_mode UNICODE_MODE, so zint refuses what the symbology cannot hold     |
+// | Rotation         | quarter turns 0-3 -> ZBarcode_Print's 0/90/180/270 degrees; other values refused       |
+// | quiet zones      | BARCODE_QUIET_ZONES for Code 39, Code 128 and 2 of 5 (EAN has them always)             |
+// | WideBarRatio     | not used: zint draws Code 39 and 2 of 5 wide bars at 3:1, within the 2:1-3:1 that the  |
+// |                  | symbologies allow; the other symbologies have no wide bars                             |
+// | Desc             | not used: zint prints the encoded text, which is what the page always passes as Desc   |
+// | C128User, UPCEUser, MatchDesc, MatchFrame, MultiLine, HoriAlign, VertAlign | not used: the picture is the  |
+// |                  | symbol and its quiet zones, with nothing to align or frame                             |
+
+namespace tagora {
+
+namespace {
+
+struct SymbolDeleter {
+    void operator()(zint_symbol* symbol) const { ZBarcode_Delete(symbol); }
+};
+using SymbolPtr = std::unique_ptr<zint_symbol, SymbolDeleter>;
+
+constexpr int kDefaultResolution = 200;
+// zint refuses a scale above 100, i.e. modules wider than 200 pixels.
+constexpr double kMaxModulePixels = 200.0;
+
+bool allDigits(const QString& text)
+{
+    for (QChar c : text) {
+        if (c < QLatin1Char('0') || c > QLatin1Char('9'))
+            return false;
+    }
+    return true;
+}
+
+bool allWithin(const QString& text, ushort first, ushort last)
+{
+    for (QChar c : text) {
+        if (c.unicode() < first || c.unicode() > last)
+            return false;
+    }
+    return true;
+}
+
+QString symbologyName(int code, bool fullAscii)
+{
+    switch (code) {
+    case 0: return fullAscii ? QStringLiteral("Code 39 full ASCII") : QStringLiteral("Code 39");
+    case 1: return QStringLiteral("Code 128");
+    case 14: return QStringLiteral("Code 128 subset A");
+    case 15: return QStringLiteral("Code 128 subset B");
+    case 9: return QStringLiteral("EAN-8");
+    case 10: return QStringLiteral("EAN-13");
+    case 4: return QStringLiteral("Interleaved 2 of 5");
+    default: return QStringLiteral("barcode type %1").arg(code);
+    }
+}
+
+// What one picture asks of zint.
+struct Recipe {
+    int symbology = BARCODE_CODE128;
+    int checkOption = 0;
+    bool quietZones = true;
+};
+
+// Chooses zint's symbology for the data, or says why the data cannot be drawn.
+// The checks here cover what zint would otherwise "fix" silently: it upper-cases
+// Code 39, pads 2 of 5 with a leading zero, and turns EAN data of the wrong
+// length into another EAN (7 digits under EAN-13 become an EAN-8).
+bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDigit, Recipe* recipe,
+                     QString* why)
+{
+    auto refuse = [why](const QString& text) {
+        *why = text;
+        return false;
+    };
+    switch (code) {
+    case 0:
+        if (fullAscii) {
+            recipe->symbology = BARCODE_EXCODE39;
+        } else {
+            for (QChar c : data) {
+                if (c.isLower())
+                    return refuse(QStringLiteral("Code 39 has no lower-case letters (full-ASCII Code 39 has)"));
+            }
+            recipe->symbology = BARCODE_CODE39;
+        }
+        recipe->checkOption = checkDigit ? 1 : 0;
+        return true;
+    case 1:
+        recipe->symbology = BARCODE_CODE128;
+        return true;
+    case 14:
+        if (!allWithin(data, 0x00, 0x5F))
+            return refuse(QStringLiteral("subset A holds upper-case letters, digits, punctuation and control characters only"));
+        recipe->symbology = BARCODE_CODE128B;
+        return true;
+    case 15:
+        if (!allWithin(data, 0x20, 0x7F))
+            return refuse(QStringLiteral("subset B holds printable ASCII characters only"));
+        recipe->symbology = BARCODE_CODE128B;
+        return true;
+    case 9:
+    case 10: {
+        const int full = code == 9 ? 8 : 13;
+        if (!allDigits(data))
+            return refuse(QStringLiteral("EAN takes digits only"));
+        recipe->quietZones = false;
+        if (data.size() == full) {
+            recipe->symbology = BARCODE_EANX_CHK; // the last digit is verified
+            return true;
+        }
+        if (data.size() == full - 1 && checkDigit) {
+            recipe->symbology = BARCODE_EANX; // zint adds the check digit
+            return true;
+        }
+        if (checkDigit)
+            return refuse(QStringLiteral("needs %1 digits, or %2 with its check digit").arg(full - 1).arg(full));
+        return refuse(QStringLiteral("needs %1 digits including the check digit").arg(full));
+    }
+    case 4: {
+        if (!allDigits(data))
+            return refuse(QStringLiteral("Interleaved 2 of 5 takes digits only"));
+        const int digits = int(data.size()) + (checkDigit ? 1 : 0);
+        if (digits % 2 != 0) {
+            return refuse(checkDigit ? QStringLiteral("needs an odd number of digits (the check digit makes it even)")
+                                     : QStringLiteral("needs an even number of digits"));
+        }
+        recipe->symbology = BARCODE_C25INTER;
+        recipe->checkOption = checkDigit ? 1 : 0;
+        return true;
+    }
+    default:
+        return refuse(QStringLiteral("this barcode type is not supported"));
+    }
+}
+
+} // namespace
+
+struct ZintBarcodeLibrary::Instance {
+    SymbolPtr symbol;
+    int unit = 0;
+    int code = 1;
+    QString data;
+    float dimX = 0.01f;
+    float barHeight = 0.4f;
+    int rotation = 0;
+    bool c39Ascii = false;
+    bool checkDigit = false;
+    bool showDesc = false;
+    int resoX = kDefaultResolution;
+    int resoY = kDefaultResolution;
+};
+
+ZintBarcodeLibrary::ZintBarcodeLibrary() = default;
+ZintBarcodeLibrary::~ZintBarcodeLibrary() = default;
+
+ZintBarcodeLibrary::Instance* ZintBarcodeLibrary::find(qint32 handle) const
+{
+    auto it = m_instances.find(handle);
+    return it == m_instances.end() ? nullptr : it->second.get();
+}
+
+qint32 ZintBarcodeLibrary::A1OpenInstance()
+{
+    auto instance = std::make_unique<Instance>();
+    instance->symbol.reset(ZBarcode_Create());
+    if (!instance->symbol)
+        return 0; // no handle: every output on it fails
+    const qint32 handle = m_nextHandle++;
+    m_instances[handle] = std::move(instance);
+    return handle;
+}
+
+void ZintBarcodeLibrary::A1CloseInstance(qint32 handle)
+{
+    m_instances.erase(handle);
+}
+
+void ZintBarcodeLibrary::A1SetUnit(qint32 handle, int unit)
+{
+    if (Instance* in = find(handle))
+        in->unit = unit;
+}
+
+void ZintBarcodeLibrary::A1SetBarType(qint32 handle, int code)
+{
+    if (Instance* in = find(handle))
+        in->code = code;
+}
+
+void ZintBarcodeLibrary::A1SetData(qint32 handle, const QString& data)
+{
+    if (Instance* in = find(handle))
+        in->data = data;
+}
+
+void ZintBarcodeLibrary::A1SetDimX(qint32 handle, float dimX)
+{
+    if (Instance* in = find(handle))
+        in->dimX = dimX;
+}
+
+void ZintBarcodeLibrary::A1SetBarHeight(qint32 handle, float height)
+{
+    if (Instance* in = find(handle))
+        in->barHeight = height;
+}
+
+void ZintBarcodeLibrary::A1SetRotation(qint32 handle, int rotation)
+{
+    if (Instance* in = find(handle))
+        in->rotation = rotation;
+}
+
+void ZintBarcodeLibrary::A1SetC39Ascii(qint32 handle, bool on)
+{
+    if (Instance* in = find(handle))
+        in->c39Ascii = on;
+}
+
+void ZintBarcodeLibrary::A1SetCheckDigit(qint32 handle, bool on)
+{
+    if (Instance* in = find(handle))
+        in->checkDigit = on;
+}
+
+void ZintBarcodeLibrary::A1SetShowDesc(qint32 handle, bool on)
+{
+    if (Instance* in = find(handle))
+        in->showDesc = on;
+}
+
+void ZintBarcodeLibrary::A1SetUserResoX(qint32 handle, int dpi)
+{
+    if (Instance* in = find(handle))
+        in->resoX = dpi > 0 ? dpi : kDefaultResolution;
+}
+
+void ZintBarcodeLibrary::A1SetUserResoY(qint32 handle, int dpi)
+{
+    if (Instance* in = find(handle))
+        in->resoY = dpi > 0 ? dpi : kDefaultResolution;
+}
+
+// Settings zint has no counterpart for (see the table above).
+void ZintBarcodeLibrary::A1SetDesc(qint32, const QString&) {}
+void ZintBarcodeLibrary::A1SetWideBarRatio(qint32, float) {}
+void ZintBarcodeLibrary::A1SetHoriAlign(qint32, int) {}
+void ZintBarcodeLibrary::A1SetVertAlign(qint32, int) {}
+void ZintBarcodeLibrary::A1SetC128User(qint32, bool) {}
+void ZintBarcodeLibrary::A1SetMatchDesc(qint32, bool) {}
+void ZintBarcodeLibrary::A1SetMatchFrame(qint32, bool) {}
+void ZintBarcodeLibrary::A1SetMultiLine(qint32, bool) {}
+void ZintBarcodeLibrary::A1SetUPCEUser(qint32, bool) {}
+
+bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QString* error)
+{
+    Instance* in = find(handle);
+    QString shown = in ? in->data : QString();
+    if (shown.size() > 40)
+        shown = shown.left(40) + QStringLiteral("...");
+    const QString what = in ? QStringLiteral("Cannot draw %1 \"%2\": ").arg(symbologyName(in->code, in->c39Ascii), shown)
+                            : QStringLiteral("Cannot draw a barcode: ");
+    auto fail = [&](const QString& why) {
+        if (error)
+            *error = what + why;
+        return false;
+    };
+
+    // The page names this picture whether or not it is made, so a picture left
+    // from an earlier job would be printed for this record.
+    const QFileInfo target(path);
+    if ((target.exists() || target.isSymLink()) && !QFile::remove(path))
+        return fail(QStringLiteral("the old picture %1 cannot be removed").arg(QDir::toNativeSeparators(path)));
+    if (!in)
+        return fail(QStringLiteral("barcode library handle %1 is not open").arg(handle));
+
+    if (in->unit != 0)
+        return fail(QStringLiteral("unit %1 is not supported (0 = inches)").arg(in->unit));
+    if (in->rotation < 0 || in->rotation > 3)
+        return fail(QStringLiteral("rotation %1 is not supported (0 to 3 quarter turns)").arg(in->rotation));
+    const double modulePixelsExact = double(in->dimX) * in->resoX;
+    if (!(modulePixelsExact > 0) || modulePixelsExact > kMaxModulePixels)
+        return fail(QStringLiteral("narrow bar width %1 is out of range").arg(QString::number(double(in->dimX))));
+    const int modulePixels = qMax(1, int(std::lround(modulePixelsExact)));
+    const double heightModules = double(in->barHeight) * in->resoY / modulePixels;
+    if (!std::isfinite(heightModules))
+        return fail(QStringLiteral("bar height %1 is out of range").arg(QString::number(double(in->barHeight))));
+
+    Recipe recipe;
+    QString why;
+    if (!chooseSymbology(in->code, in->data, in->c39Ascii, in->checkDigit, &recipe, &why))
+        return fail(why);
+
+    // A fresh symbol for every picture: zint writes back into its settings
+    // (height, text) while encoding, and nothing may carry over.
+    in->symbol.reset(ZBarcode_Create());
+    zint_symbol* symbol = in->symbol.get();
+    if (!symbol)
+        return fail(QStringLiteral("out of memory"));
+    symbol->symbology = recipe.symbology;
+    symbol->input_mode = UNICODE_MODE;
+    symbol->option_2 = recipe.checkOption;
+    symbol->scale = float(modulePixels) / 2.0f;
+    if (heightModules > 0)
+        symbol->height = float(heightModules);
+    symbol->show_hrt = in->showDesc ? 1 : 0;
+    if (recipe.quietZones)
+        symbol->output_options |= BARCODE_QUIET_ZONES;
+
+    const QByteArray utf8 = in->data.toUtf8();
+    int rc = ZBarcode_Encode(symbol, reinterpret_cast<const unsigned char*>(utf8.constData()), int(utf8.size()));
+    if (rc >= ZINT_ERROR)
+        return fail(QString::fromUtf8(symbol->errtxt));
+
+    // zint chooses the format by the name's extension and keeps the name in a
+    // fixed buffer; any other name is written in a scratch folder and moved.
+    const QByteArray nativeName = QFile::encodeName(path);
+    const bool direct = path.endsWith(QLatin1String(".bmp"), Qt::CaseInsensitive)
+                        && nativeName.size() < qsizetype(sizeof symbol->outfile);
+    QTemporaryDir scratch;
+    QString written = path;
+    if (!direct) {
+        if (!scratch.isValid())
+            return fail(QStringLiteral("no scratch folder: %1").arg(scratch.errorString()));
+        written = scratch.filePath(QStringLiteral("picture.bmp"));
+        if (QFile::encodeName(written).size() >= qsizetype(sizeof symbol->outfile))
+            return fail(QStringLiteral("the temporary folder's name is too long"));
+    }
+    const QByteArray outfile = QFile::encodeName(written);
+    qstrncpy(symbol->outfile, outfile.constData(), sizeof symbol->outfile);
+
+    rc = ZBarcode_Print(symbol, in->rotation * 90);
+    if (rc >= ZINT_ERROR) {
+        QFile::remove(written);
+        return fail(QString::fromUtf8(symbol->errtxt));
+    }
+    if (!direct && !QFile::rename(written, path)) {
+        QFile::remove(path);
+        return fail(QStringLiteral("the picture cannot be written to %1").arg(QDir::toNativeSeparators(path)));
+    }
+    if (!QFileInfo::exists(path))
+        return fail(QStringLiteral("the picture %1 was not written").arg(QDir::toNativeSeparators(path)));
+    return true;
+}
+
+QString BarcodeImageName(int fieldIndex, int recordNumber)
+{
+    return QStringLiteral("B%1%2.BMP")
+        .arg(fieldIndex, 2, 10, QLatin1Char('0'))
+        .arg(recordNumber, 5, 10, QLatin1Char('0'));
+}
+
+int libraryBarType(short barType, LabelBarDef& workingCopy)
+{
+    switch (barType) {
+    case 0: return 0;
+    case 1:
+        workingCopy.C39Ascii = true;
+        return 0;
+    case 2: return 1;
+    case 3: return 14;
+    case 4: return 15;
+    case 5: return 9;
+    case 6: return 10;
+    case 7: return 4;
+    default: return barType;
+    }
+}
+
+bool DrawBarcode(const QString& data, const QString& file, const LabelBarDef& bar, int libraryCode,
+                 BarcodeLibrary& lib, qint32 handle, QString* error)
+{
+    // The designer lets these boxes be cleared or hold nonsense; the library
+    // would draw nothing readable from a zero width or ratio. A NaN counts
+    // as nonsense too.
+    const float dimX = bar.DimX > 0 ? bar.DimX : 0.01f;
+    const float ratio = bar.WideBarRatio > 0 ? bar.WideBarRatio : 2.2f;
+
+    lib.A1SetUnit(handle, 0);
+    lib.A1SetBarType(handle, libraryCode);
+    lib.A1SetData(handle, data);
+    lib.A1SetDesc(handle, data);
+    lib.A1SetDimX(handle, dimX);
+    lib.A1SetWideBarRatio(handle, ratio);
+    lib.A1SetBarHeight(handle, bar.BarHeight);
+    lib.A1SetHoriAlign(handle, 1);
+    lib.A1SetVertAlign(handle, 1);
+    lib.A1SetRotation(handle, 0);
+    lib.A1SetC128User(handle, bar.C128User);
+    lib.A1SetC39Ascii(handle, bar.C39Ascii);
+    lib.A1SetCheckDigit(handle, bar.CheckDigit);
+    lib.A1SetMatchDesc(handle, false);
+    lib.A1SetMatchFrame(handle, false);
+    lib.A1SetMultiLine(handle, false);
+    lib.A1SetShowDesc(handle, bar.ShowDesc);
+    lib.A1SetUPCEUser(handle, false);
+    // The picture's display size on the page is the page's business; the
+    // library always draws at the printer resolution.
+    lib.A1SetUserResoX(handle, 200);
+    lib.A1SetUserResoY(handle, 200);
+    return lib.A1OutputBitmap(handle, file, error);
+}
+
+} // namespace tagora

@@ -1,0 +1,144 @@
+#include "support/dbrows.h"
+
+#include "dialogs/boundgrid.h"
+#include "dialogs/frmselectitem.h"
+#include "localdb/database.h"
+#include "localdb/schema.h"
+
+#include <QLineEdit>
+#include <QPushButton>
+#include <QComboBox>
+#include <QTemporaryDir>
+#include <QtTest>
+
+using namespace tagora;
+
+class TestFrmSelectItem : public QObject {
+    Q_OBJECT
+    QTemporaryDir dir;
+    QString folder;
+    QString items;
+
+    void fill(const QString& sql)
+    {
+        Database d;
+        QVERIFY(!d.open(items));
+        QVERIFY(!d.exec("DELETE FROM tItems"));
+        QVERIFY(!d.exec(sql));
+    }
+
+    static QStringList keys(FrmSelectItem& f)
+    {
+        QStringList out;
+        for (int r = 0; r < f.model()->rowCount(); ++r)
+            out << f.model()->value(r, "ItemKey").toString();
+        return out;
+    }
+
+    template <class T> static T* c(FrmSelectItem& f, const QString& name) { return f.findChild<T*>(name); }
+    static BoundGrid* grid(FrmSelectItem& f) { return c<BoundGrid>(f, "VSSelectItems"); }
+
+private slots:
+    void initTestCase()
+    {
+        folder = dir.filePath("data");
+        QVERIFY(!PrepareDataFolder(folder));
+        items = folder + "/" + dbfiles::Items;
+    }
+
+    void firstPageInOrder()
+    {
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('C', 'c', 1, 0), ('A', 'a', 1, 0), ('B', 'b', 1, 0), ('D', 'd', 1, 0)");
+        FrmSelectItem f(folder, QString(), nullptr);
+        QCOMPARE(keys(f), QStringList({"A", "B", "C", "D"}));
+        c<QLineEdit>(f, "txtItemsNum")->setText("2");
+        c<QPushButton>(f, "cmdShowAll")->click();
+        QCOMPARE(keys(f), QStringList({"A", "B"}));
+        // Not a number: the usual page.
+        c<QLineEdit>(f, "txtItemsNum")->setText("abc");
+        QVERIFY(f.BuildSelectItemsQuery({}, false, 0, 0).endsWith(" LIMIT 500"));
+    }
+
+    void findByKey_data()
+    {
+        QTest::addColumn<QString>("typed");
+        QTest::addColumn<QString>("current");
+        QTest::addColumn<QString>("ticked");
+        QTest::newRow("exact key ticks it") << "A1" << "A1" << "A1";
+        QTest::newRow("start of a key ticks nothing") << "A" << "A0" << "";
+        QTest::newRow("apostrophe in the key") << "O'R" << "O'R" << "O'R";
+        QTest::newRow("no such key lists from there") << "Z" << "" << "";
+    }
+    void findByKey()
+    {
+        QFETCH(QString, typed);
+        QFETCH(QString, current);
+        QFETCH(QString, ticked);
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('A0', 'x', 1, 0), ('A1', 'x', 1, 0), ('A10', 'x', 1, 0),"
+             " ('O''R', 'x', 1, 0)");
+        FrmSelectItem f(folder, QString(), nullptr);
+        c<QLineEdit>(f, "txtToItemkey")->setText(typed);
+        c<QPushButton>(f, "cmdFindKey")->click();
+        const int row = grid(f)->currentRowIndex();
+        QCOMPARE(row >= 0 && !current.isEmpty() ? f.model()->value(row, "ItemKey").toString() : QString(), current);
+        QCOMPARE(rows(items, "SELECT ItemKey FROM tItems WHERE PrintLabel = 1").join(','), ticked);
+    }
+
+    // Marked items stay in the list whatever the search, and come first either way.
+    void markedStayListedAndFirst()
+    {
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('A1', 'x', 1, 0), ('B1', 'x', 1, 0), ('K9', 'x', 1, 1)");
+        FrmSelectItem f(folder, " And ItemKey <= 'B9'", nullptr);
+        QCOMPARE(keys(f), QStringList({"K9", "A1", "B1"}));
+        c<QComboBox>(f, "cmbItmSortOrder")->setCurrentIndex(1);
+        c<QPushButton>(f, "cmdShowAll")->click();
+        QCOMPARE(keys(f), QStringList({"K9", "B1", "A1"}));
+        c<QPushButton>(f, "cmdShowMarked")->click();
+        QCOMPARE(keys(f), QStringList({"K9"}));
+    }
+
+    void markAllTouchesOnlyTheList()
+    {
+        fill("WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < 2000)"
+             " INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) SELECT printf('I%04d', i), 'x', 1, 0 FROM n");
+        FrmSelectItem f(folder, QString(), nullptr);
+        QCOMPARE(f.model()->rowCount(), 500);
+        c<QPushButton>(f, "CmdAllItems")->click();
+        QCOMPARE(rows(items, "SELECT count(*), min(ItemKey), max(ItemKey) FROM tItems WHERE PrintLabel = 1"),
+                 QStringList{"500|I0001|I0500"});
+        c<QLineEdit>(f, "txtAllCopis")->setText("4");
+        c<QPushButton>(f, "CmdAllCopies")->click();
+        QCOMPARE(rows(items, "SELECT Copies, count(*) FROM tItems GROUP BY Copies ORDER BY 1"), QStringList({"1|1500", "4|500"}));
+        c<QLineEdit>(f, "txtAllCopis")->setText("many");
+        c<QPushButton>(f, "CmdAllCopies")->click();
+        QCOMPARE(rows(items, "SELECT count(*) FROM tItems WHERE Copies = 0"), QStringList{"500"});
+        c<QPushButton>(f, "cmdNoneItems")->click();
+        QCOMPARE(rows(items, "SELECT count(*) FROM tItems WHERE PrintLabel = 1"), QStringList{"0"});
+    }
+
+    void findByDescription_data()
+    {
+        QTest::addColumn<int>("button");
+        QTest::addColumn<QString>("text");
+        QTest::addColumn<QString>("found");
+        QTest::newRow("start of the name") << 0 << "bolt" << "B1";
+        QTest::newRow("any part, case counts") << 1 << "Nut" << "N2";
+        QTest::newRow("wildcards are plain text") << 1 << "50%" << "P5";
+        QTest::newRow("apostrophe") << 0 << "it's" << "Q1";
+    }
+    void findByDescription()
+    {
+        QFETCH(int, button);
+        QFETCH(QString, text);
+        QFETCH(QString, found);
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('B1', 'Bolt M6', 1, 0), ('N1', 'lock nut', 1, 0),"
+             " ('N2', 'Lock Nut', 1, 0), ('P5', 'Paint 50% off', 1, 0), ('P6', 'Paint 500', 1, 0), ('Q1', 'it''s here', 1, 0)");
+        FrmSelectItem f(folder, QString(), nullptr);
+        c<QLineEdit>(f, "txtToItemName")->setText(text);
+        c<QPushButton>(f, QStringLiteral("cmdFindByDesc(%1)").arg(button))->click();
+        QCOMPARE(f.model()->value(grid(f)->currentRowIndex(), "ItemKey").toString(), found);
+    }
+};
+
+QTEST_MAIN(TestFrmSelectItem)
+#include "tst_frmselectitem.moc"

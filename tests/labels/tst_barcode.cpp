@@ -1,0 +1,382 @@
+#include "labels/barcode.h"
+
+#include <QDir>
+#include <QFile>
+#include <QImage>
+#include <QProcess>
+#include <QStandardPaths>
+#include <QTemporaryDir>
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+
+// Writes down every call, in order, as NAME(ARGS).
+class RecordingLibrary : public BarcodeLibrary {
+public:
+    QStringList calls;
+    bool outputResult = true;
+    QString outputError;
+
+    qint32 A1OpenInstance() override
+    {
+        note("A1OpenInstance");
+        return 7;
+    }
+    void A1SetUnit(qint32 h, int v) override { note("A1SetUnit", h, v); }
+    void A1SetBarType(qint32 h, int v) override { note("A1SetBarType", h, v); }
+    void A1SetData(qint32 h, const QString& v) override { note("A1SetData", h, v); }
+    void A1SetDesc(qint32 h, const QString& v) override { note("A1SetDesc", h, v); }
+    void A1SetDimX(qint32 h, float v) override { note("A1SetDimX", h, v); }
+    void A1SetWideBarRatio(qint32 h, float v) override { note("A1SetWideBarRatio", h, v); }
+    void A1SetBarHeight(qint32 h, float v) override { note("A1SetBarHeight", h, v); }
+    void A1SetHoriAlign(qint32 h, int v) override { note("A1SetHoriAlign", h, v); }
+    void A1SetVertAlign(qint32 h, int v) override { note("A1SetVertAlign", h, v); }
+    void A1SetRotation(qint32 h, int v) override { note("A1SetRotation", h, v); }
+    void A1SetC128User(qint32 h, bool v) override { note("A1SetC128User", h, v); }
+    void A1SetC39Ascii(qint32 h, bool v) override { note("A1SetC39Ascii", h, v); }
+    void A1SetCheckDigit(qint32 h, bool v) override { note("A1SetCheckDigit", h, v); }
+    void A1SetMatchDesc(qint32 h, bool v) override { note("A1SetMatchDesc", h, v); }
+    void A1SetMatchFrame(qint32 h, bool v) override { note("A1SetMatchFrame", h, v); }
+    void A1SetMultiLine(qint32 h, bool v) override { note("A1SetMultiLine", h, v); }
+    void A1SetShowDesc(qint32 h, bool v) override { note("A1SetShowDesc", h, v); }
+    void A1SetUPCEUser(qint32 h, bool v) override { note("A1SetUPCEUser", h, v); }
+    void A1SetUserResoX(qint32 h, int v) override { note("A1SetUserResoX", h, v); }
+    void A1SetUserResoY(qint32 h, int v) override { note("A1SetUserResoY", h, v); }
+    bool A1OutputBitmap(qint32 h, const QString& path, QString* error) override
+    {
+        note("A1OutputBitmap", h, path);
+        if (!outputResult && error)
+            *error = outputError;
+        return outputResult;
+    }
+    void A1CloseInstance(qint32 h) override { note("A1CloseInstance", h); }
+
+private:
+    template <typename... Args>
+    void note(const char* name, Args... args)
+    {
+        QString text;
+        QDebug out(&text);
+        out.nospace() << name << '(';
+        const char* separator = "";
+        ((out << separator << args, separator = ", "), ...);
+        out << ')';
+        calls << text;
+    }
+};
+
+void writeStale(const QString& path)
+{
+    QFile f(path);
+    QVERIFY(f.open(QIODevice::WriteOnly));
+    f.write("a picture from an earlier job");
+}
+
+// Draws one picture the way a label line does: translation, one handle, one call.
+bool drawWithZint(short position, const QString& data, LabelBarDef bar, const QString& file, QString* error)
+{
+    ZintBarcodeLibrary lib;
+    const int code = libraryBarType(position, bar);
+    const qint32 handle = lib.A1OpenInstance();
+    const bool ok = DrawBarcode(data, file, bar, code, lib, handle, error);
+    lib.A1CloseInstance(handle);
+    return ok;
+}
+
+} // namespace
+
+class TestBarcode : public QObject {
+    Q_OBJECT
+
+    QString m_zbarimg;
+
+    // The symbology zbar saw and the text it read, or empty texts.
+    QPair<QString, QString> decode(const QString& file)
+    {
+        QProcess zbar;
+        zbar.start(m_zbarimg, {QStringLiteral("-q"), file});
+        if (!zbar.waitForFinished(60000))
+            return {};
+        QString out = QString::fromUtf8(zbar.readAllStandardOutput());
+        out = out.section('\n', 0, 0);
+        const int colon = int(out.indexOf(':'));
+        if (colon < 0)
+            return {};
+        return {out.left(colon), out.mid(colon + 1)};
+    }
+
+private slots:
+    void initTestCase()
+    {
+        m_zbarimg = QStandardPaths::findExecutable(QStringLiteral("zbarimg"));
+        QVERIFY2(!m_zbarimg.isEmpty(), "zbarimg (package zbar-tools) is needed to read the pictures back");
+    }
+
+    void imageName_data()
+    {
+        QTest::addColumn<int>("field");
+        QTest::addColumn<int>("record");
+        QTest::addColumn<QString>("name");
+        QTest::newRow("field 3 record 12") << 3 << 12 << "B0300012.BMP";
+        QTest::newRow("first record") << 0 << 1 << "B0000001.BMP";
+        QTest::newRow("digits beyond the padding") << 123 << 123456 << "B123123456.BMP";
+    }
+    void imageName()
+    {
+        QFETCH(int, field);
+        QFETCH(int, record);
+        QFETCH(QString, name);
+        QCOMPARE(BarcodeImageName(field, record), name);
+    }
+
+    void translation_data()
+    {
+        QTest::addColumn<int>("position");
+        QTest::addColumn<int>("lines");
+        QTest::addColumn<int>("code");
+        QTest::addColumn<bool>("fullAscii");
+        QTest::newRow("CODE-39") << 0 << 1 << 0 << false;
+        QTest::newRow("CODE-39 Ascii") << 1 << 1 << 0 << true;
+        QTest::newRow("CODE-128") << 2 << 1 << 1 << false;
+        QTest::newRow("CODE-128A") << 3 << 1 << 14 << false;
+        QTest::newRow("CODE-128B") << 4 << 1 << 15 << false;
+        QTest::newRow("EAN-8") << 5 << 1 << 9 << false;
+        QTest::newRow("EAN-13") << 6 << 1 << 10 << false;
+        QTest::newRow("Interleaved 2 of 5") << 7 << 1 << 4 << false;
+        QTest::newRow("beyond the list") << 8 << 1 << 8 << false;
+        QTest::newRow("two lines sharing CODE-128") << 2 << 2 << 1 << false;
+        QTest::newRow("three lines sharing CODE-39 Ascii") << 1 << 3 << 0 << true;
+    }
+    void translation()
+    {
+        QFETCH(int, position);
+        QFETCH(int, lines);
+        QFETCH(int, code);
+        QFETCH(bool, fullAscii);
+        LabelBarDef working;
+        working.BarType = short(position);
+        for (int line = 0; line < lines; ++line) {
+            QCOMPARE(libraryBarType(working.BarType, working), code);
+            QCOMPARE(working.BarType, short(position));
+        }
+        QCOMPARE(working.C39Ascii, fullAscii);
+    }
+
+    void callOrder_data()
+    {
+        QTest::addColumn<float>("dimX");
+        QTest::addColumn<float>("ratio");
+        QTest::addColumn<QString>("dimXPassed");
+        QTest::addColumn<QString>("ratioPassed");
+        QTest::addColumn<bool>("outputOk");
+        QTest::newRow("as set") << 0.015f << 2.5f << "0.015" << "2.5" << true;
+        QTest::newRow("zero width and ratio") << 0.0f << 0.0f << "0.01" << "2.2" << true;
+        QTest::newRow("negative width and ratio") << -0.02f << -3.0f << "0.01" << "2.2" << true;
+        QTest::newRow("not a number") << std::numeric_limits<float>::quiet_NaN() << 3.0f << "0.01" << "3" << true;
+        QTest::newRow("output fails") << 0.01f << 2.2f << "0.01" << "2.2" << false;
+    }
+    void callOrder()
+    {
+        QFETCH(float, dimX);
+        QFETCH(float, ratio);
+        QFETCH(QString, dimXPassed);
+        QFETCH(QString, ratioPassed);
+        QFETCH(bool, outputOk);
+
+        LabelBarDef bar;
+        bar.DimX = dimX;
+        bar.WideBarRatio = ratio;
+        bar.BarHeight = 0.75f;
+        bar.C128User = true;
+        bar.CheckDigit = false;
+        bar.ShowDesc = true;
+        bar.UserResoY = -1;
+        RecordingLibrary lib;
+        lib.outputResult = outputOk;
+        lib.outputError = QStringLiteral("Error 275: Invalid check digit");
+        QString error;
+
+        const bool ok = DrawBarcode(QStringLiteral("A'1 ש"), QStringLiteral("/tmp/tgrlab/B0300012.BMP"), bar, 14,
+                                    lib, 7, &error);
+
+        const QStringList expected = {
+            "A1SetUnit(7, 0)",
+            "A1SetBarType(7, 14)",
+            "A1SetData(7, \"A'1 ש\")",
+            "A1SetDesc(7, \"A'1 ש\")",
+            "A1SetDimX(7, " + dimXPassed + ")",
+            "A1SetWideBarRatio(7, " + ratioPassed + ")",
+            "A1SetBarHeight(7, 0.75)",
+            "A1SetHoriAlign(7, 1)",
+            "A1SetVertAlign(7, 1)",
+            "A1SetRotation(7, 0)",
+            "A1SetC128User(7, true)",
+            "A1SetC39Ascii(7, false)",
+            "A1SetCheckDigit(7, false)",
+            "A1SetMatchDesc(7, false)",
+            "A1SetMatchFrame(7, false)",
+            "A1SetMultiLine(7, false)",
+            "A1SetShowDesc(7, true)",
+            "A1SetUPCEUser(7, false)",
+            "A1SetUserResoX(7, 200)",
+            "A1SetUserResoY(7, 200)",
+            "A1OutputBitmap(7, \"/tmp/tgrlab/B0300012.BMP\")",
+        };
+        QCOMPARE(lib.calls, expected);
+        QCOMPARE(ok, outputOk);
+        if (!outputOk)
+            QCOMPARE(error, lib.outputError);
+    }
+
+    // Every supported symbology, read back by a scanner program. The odd
+    // names cover zint choosing the format by extension and its short buffer.
+    void decodes_data()
+    {
+        QTest::addColumn<int>("position");
+        QTest::addColumn<QString>("data");
+        QTest::addColumn<bool>("checkDigit");
+        QTest::addColumn<QString>("name");
+        QTest::addColumn<QString>("symbology");
+        QTest::addColumn<QString>("decoded");
+        const QString b = BarcodeImageName(3, 12);
+        QTest::newRow("CODE-39") << 0 << "TAG-42 $/+%." << false << b << "CODE-39" << "TAG-42 $/+%.";
+        QTest::newRow("CODE-39 check character") << 0 << "TAG42" << true << b << "CODE-39" << "TAG42I";
+        // zbar does not fold full-ASCII pairs back, so they show what was encoded.
+        QTest::newRow("CODE-39 Ascii") << 1 << "ab#c" << false << b << "CODE-39" << "+A+B/C+C";
+        QTest::newRow("CODE-128") << 2 << "Item-42 abc" << true << b << "CODE-128" << "Item-42 abc";
+        QTest::newRow("CODE-128A") << 3 << "AB\tC-1" << false << b << "CODE-128" << "AB\tC-1";
+        QTest::newRow("CODE-128B") << 4 << "Item-42 abc~" << false << b << "CODE-128" << "Item-42 abc~";
+        QTest::newRow("EAN-8 check added") << 5 << "1234567" << true << b << "EAN-8" << "12345670";
+        QTest::newRow("EAN-8 whole, check on") << 5 << "12345670" << true << b << "EAN-8" << "12345670";
+        QTest::newRow("EAN-13") << 6 << "5901234123457" << false << b << "EAN-13" << "5901234123457";
+        QTest::newRow("EAN-13 check added") << 6 << "590123412345" << true << b << "EAN-13" << "5901234123457";
+        QTest::newRow("2 of 5") << 7 << "123456" << false << b << "I2/5" << "123456";
+        QTest::newRow("2 of 5 check added") << 7 << "1234567" << true << b << "I2/5" << "12345670";
+        QTest::newRow("png name") << 2 << "Item" << false << "B0300012.png" << "CODE-128" << "Item";
+        QTest::newRow("Hebrew folder") << 2 << "Item" << false << "תוויות/B.bmp" << "CODE-128" << "Item";
+        QTest::newRow("long name") << 2 << "Item" << false << QString(QString(60, 'd') + '/').repeated(5) + b
+                                   << "CODE-128" << "Item";
+    }
+    void decodes()
+    {
+        QFETCH(int, position);
+        QFETCH(QString, data);
+        QFETCH(bool, checkDigit);
+        QFETCH(QString, name);
+        QFETCH(QString, symbology);
+        QFETCH(QString, decoded);
+        QTemporaryDir dir;
+        const QString file = dir.filePath(name);
+        QVERIFY(QDir().mkpath(QFileInfo(file).path()));
+        writeStale(file);
+        LabelBarDef bar;
+        bar.CheckDigit = checkDigit;
+        bar.ShowDesc = true;
+        QString error;
+
+        QVERIFY2(drawWithZint(short(position), data, bar, file, &error), qPrintable(error));
+
+        QFile written(file);
+        QVERIFY(written.open(QIODevice::ReadOnly));
+        QCOMPARE(written.read(2), QByteArray("BM"));
+        QCOMPARE(decode(file), qMakePair(symbology, decoded));
+        QCOMPARE(QFileInfo(file).dir().entryList(QDir::Files).size(), 1);
+    }
+
+    void refuses_data()
+    {
+        QTest::addColumn<int>("position");
+        QTest::addColumn<QString>("data");
+        QTest::addColumn<bool>("checkDigit");
+        QTest::addColumn<QString>("reason");
+        QTest::newRow("letter in EAN-13") << 6 << "59012341234A7" << true << "digits only";
+        QTest::newRow("EAN-13 wrong check digit") << 6 << "5901234123458" << true << "Invalid check digit";
+        QTest::newRow("EAN-13 short, check off") << 6 << "590123412345" << false << "including the check digit";
+        QTest::newRow("EAN-8 data as EAN-13") << 6 << "1234567" << true << "needs 12 digits";
+        QTest::newRow("EAN-8 whole as EAN-13") << 6 << "12345670" << false << "needs 13 digits";
+        QTest::newRow("lower case in CODE-39") << 0 << "tag-42" << false << "lower-case";
+        QTest::newRow("hash in CODE-39") << 0 << "TAG#42" << false << "Invalid character";
+        QTest::newRow("CODE-128 too long") << 2 << QString(161, 'A') << false << "too long";
+        QTest::newRow("Hebrew in CODE-128") << 2 << "שלום 12" << false << "8859-1";
+        QTest::newRow("lower case in CODE-128A") << 3 << "abc" << false << "subset A";
+        QTest::newRow("control character in CODE-128B") << 4 << "A\tB" << false << "subset B";
+        QTest::newRow("odd count in 2 of 5") << 7 << "12345" << false << "even number";
+        QTest::newRow("nothing to encode") << 2 << "" << false << "No input data";
+        QTest::newRow("unknown library code") << 99 << "123" << false << "not supported";
+    }
+    void refuses()
+    {
+        QFETCH(int, position);
+        QFETCH(QString, data);
+        QFETCH(bool, checkDigit);
+        QFETCH(QString, reason);
+        QTemporaryDir dir;
+        const QString file = dir.filePath(BarcodeImageName(5, 1));
+        writeStale(file);
+        LabelBarDef bar;
+        bar.CheckDigit = checkDigit;
+        QString error;
+
+        QVERIFY(!drawWithZint(short(position), data, bar, file, &error));
+
+        QVERIFY2(error.contains(reason, Qt::CaseInsensitive), qPrintable(error));
+        QVERIFY(!QFile::exists(file));
+    }
+
+    // Unit 0 is the inch, drawn at 200 dots per inch; no text under the bars.
+    void pictureSize_data()
+    {
+        QTest::addColumn<int>("position");
+        QTest::addColumn<float>("dimX");
+        QTest::addColumn<float>("barHeight");
+        QTest::addColumn<QSize>("size");
+        // 79 modules and 10 quiet modules each side.
+        QTest::newRow("CODE-128 0.01 by 0.5") << 2 << 0.01f << 0.5f << QSize(198, 100);
+        QTest::newRow("CODE-128 width replaced") << 2 << 0.0f << 0.5f << QSize(198, 100);
+        QTest::newRow("CODE-128 0.015 by 1") << 2 << 0.015f << 1.0f << QSize(297, 200);
+        // 95 modules, 11 and 7 quiet modules; guard bars reach 5 modules lower.
+        QTest::newRow("EAN-13 0.01 by 0.5") << 6 << 0.01f << 0.5f << QSize(226, 110);
+    }
+    void pictureSize()
+    {
+        QFETCH(int, position);
+        QFETCH(float, dimX);
+        QFETCH(float, barHeight);
+        QFETCH(QSize, size);
+        QTemporaryDir dir;
+        const QString file = dir.filePath(BarcodeImageName(1, 1));
+        LabelBarDef bar;
+        bar.DimX = dimX;
+        bar.BarHeight = barHeight;
+        QString error;
+
+        const QString data = position == 6 ? QStringLiteral("5901234123457") : QStringLiteral("12345678");
+        QVERIFY2(drawWithZint(short(position), data, bar, file, &error), qPrintable(error));
+
+        QCOMPARE(QImage(file, "BMP").size(), size);
+    }
+
+    void closedHandle()
+    {
+        QTemporaryDir dir;
+        const QString file = dir.filePath(BarcodeImageName(2, 3));
+        ZintBarcodeLibrary lib;
+        const qint32 handle = lib.A1OpenInstance();
+        QCOMPARE(lib.openInstances(), 1);
+        LabelBarDef bar;
+        QString error;
+        QVERIFY2(DrawBarcode(QStringLiteral("Item"), file, bar, 1, lib, handle, &error), qPrintable(error));
+
+        lib.A1CloseInstance(handle);
+
+        QCOMPARE(lib.openInstances(), 0);
+        QVERIFY(!DrawBarcode(QStringLiteral("Item"), file, bar, 1, lib, handle, &error));
+        QVERIFY2(error.contains(QStringLiteral("not open")), qPrintable(error));
+        QVERIFY(!QFile::exists(file));
+    }
+};
+
+QTEST_GUILESS_MAIN(TestBarcode)
+#include "tst_barcode.moc"
