@@ -298,6 +298,8 @@ private slots:
         QSignalSpy spy(f.c<QPushButton>(button), &QPushButton::clicked);
         QVERIFY(clickControl(f.c(picture)));
         QCOMPARE(spy.count(), 1);
+        if (button == "cmdSelectItems")
+            QCOMPARE(f.dialogs->opened, QStringList{"frmSelectItem"});
     }
 
     void printerListSkipsRenderingSubsystem()

@@ -9,10 +9,29 @@
 #include "control/settingsstore.h"
 
 #include <QComboBox>
+#include <QDialog>
+#include <functional>
 #include <QFile>
 #include <QStandardPaths>
 #include <QTemporaryDir>
 #include <memory>
+
+// Dialogs opened by a command in a test: each is recorded and handed to the
+// test's callback (if any), then closed, so nothing waits for a user.
+struct TestDialogRunner : tagora::DialogRunner {
+    QStringList opened;
+    std::function<void(QDialog&)> drive;
+    int run(QDialog& dialog) override
+    {
+        opened << dialog.objectName();
+        dialog.show();
+        if (drive)
+            drive(dialog);
+        if (dialog.isVisible())
+            dialog.reject();
+        return dialog.result();
+    }
+};
 
 struct CardFixture {
     QTemporaryDir dir;
@@ -20,6 +39,7 @@ struct CardFixture {
     std::shared_ptr<tagora::IniSettingsStore> store;
     std::shared_ptr<tagora::ScriptedPrompt> prompt = std::make_shared<tagora::ScriptedPrompt>(nullptr);
     std::shared_ptr<tagora::ScriptedFileDialog> files = std::make_shared<tagora::ScriptedFileDialog>();
+    std::shared_ptr<TestDialogRunner> dialogs = std::make_shared<TestDialogRunner>();
     std::unique_ptr<tagora::MainCard> card;
 
     // iniText is written to the settings file first when given; priceFields
@@ -38,6 +58,7 @@ struct CardFixture {
         s.settings = store;
         s.prompt = prompt;
         s.fileDialog = files;
+        s.dialogs = dialogs;
         s.printers = std::make_shared<tagora::FixedPrinterCatalog>(printers);
         card = std::make_unique<tagora::MainCard>(nullptr, s);
         card->control<QComboBox>(QStringLiteral("cmbPriceField"))->addItems(priceFields);
