@@ -5,8 +5,7 @@
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
 #include "labels/labelrun.h"
-#include "localdb/database.h"
-#include "localdb/schema.h"
+#include "benchdata.h"
 
 #include <QCoreApplication>
 #include <QElapsedTimer>
@@ -20,25 +19,12 @@ int main(int argc, char** argv)
     QCoreApplication app(argc, argv);
     const int items = argc > 1 ? QString::fromLocal8Bit(argv[1]).toInt() : 20000;
     QTemporaryDir dir;
-    const QString folder = dir.filePath(QStringLiteral("data"));
-    const QString docs = folder + QStringLiteral("/") + dbfiles::TempDocs;
-    DbError e = PrepareDataFolder(folder);
-    if (!e)
-        CreateTempDocsDB(folder + "/" + dbfiles::Config, folder + "/" + dbfiles::Items, docs, &e);
-    if (!e) {
-        Database db;
-        e = db.open(docs);
-        if (!e)
-            e = db.exec(QStringLiteral(
-                "WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < %1)"
-                " INSERT INTO tItems (ItemKey, ItemName, ItemSort, BarCode, Unit, Price, Coin, Copies, PrintLabel, VNItemName)"
-                " SELECT printf('IT%06d', i), 'פריט ' || i, '10', printf('729%010d', i), 'יח''', i * 1.25, 'ILS', 1 + i % 3, 1,"
-                " 'x' FROM n").arg(items));
-    }
-    if (e) {
-        std::fprintf(stderr, "data: %s\n", qPrintable(e.message));
+    const QString docs = benchDataFolder(dir, items, QStringLiteral(
+        "INSERT INTO tItems (ItemKey, ItemName, ItemSort, BarCode, Unit, Price, Coin, Copies, PrintLabel, VNItemName)"
+        " SELECT printf('IT%06d', i), 'פריט ' || i, '10', printf('729%010d', i), 'יח''', i * 1.25, 'ILS', 1 + i % 3, 1,"
+        " 'x' FROM n"));
+    if (docs.isEmpty())
         return 1;
-    }
 
     LabelQuerySettings q;
     LabelRunRequest r;

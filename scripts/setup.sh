@@ -9,7 +9,7 @@ PACKAGES=(
   libsqlite3-dev sqlite3
   unixodbc unixodbc-dev libsqliteodbc odbc-postgresql postgresql
   fonts-dejavu-core
-  libzint-dev zbar-tools
+  libzint-dev zint zbar-tools libcups2-dev chromium
 )
 
 missing=()

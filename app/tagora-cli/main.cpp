@@ -14,11 +14,13 @@
 #include "control/settingsstore.h"
 #include "control/settingstable.h"
 #include "erp/demosetup.h"
+#include "labels/browser.h"
 
 #include <QAbstractItemView>
 #include <QApplication>
 #include <QComboBox>
 #include <QDialog>
+#include <QDir>
 #include <QFile>
 #include <QTextStream>
 #include <cstdio>
@@ -110,6 +112,16 @@ bool readScript(const QString& path, QStringList* tokens)
     return true;
 }
 
+// Without a screen there is no browser to open: the page's path is printed.
+class PrintedPages : public PageViewer {
+public:
+    bool showPage(const QString& path, QString*) override
+    {
+        out(QStringLiteral("page: ") + QDir::toNativeSeparators(path));
+        return true;
+    }
+};
+
 class Interpreter : public DialogRunner {
 public:
     explicit Interpreter(QStringList tokens)
@@ -178,6 +190,7 @@ private:
         m_store = services.settings;
         services.prompt = m_prompt;
         services.fileDialog = m_files;
+        services.pages = std::make_shared<PrintedPages>();
         // The card lives as long as this interpreter, which outlives every use of it.
         services.dialogs = std::shared_ptr<DialogRunner>(this, [](DialogRunner*) {});
         m_card = std::make_unique<MainCard>(nullptr, services);

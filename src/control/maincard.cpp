@@ -11,6 +11,7 @@
 #include "control/settingstable.h"
 #include "labels/labelfields.h"
 #include "dialogs/frmselectitem.h"
+#include "labels/browser.h"
 #include "labels/itemquery.h"
 #include "localdb/schema.h"
 
@@ -69,6 +70,8 @@ MainCard::MainCard(QWidget* parent, Services services)
         m_services.printers = systemPrinterCatalog();
     if (!m_services.dialogs)
         m_services.dialogs = std::make_shared<DialogRunner>();
+    if (!m_services.pages)
+        m_services.pages = std::make_shared<DesktopPageViewer>(m_services.settings.get());
 
     ui->setupUi(this);
     setLayoutDirection(Qt::RightToLeft);
@@ -232,6 +235,13 @@ void MainCard::connectHandlers()
             connect(l, &ClickLabel::clicked, this, [this, b = QString::fromLatin1(button)] { stepPicture_Click(b); });
 
     connect(ui->LblToDate, &ClickLabel::clicked, this, &MainCard::LblToDate_Click);
+    // Choosing Direct after the control was shown reads the stored layout
+    // first, so a save of the general settings cannot overwrite it with an
+    // empty one.
+    connect(control<QRadioButton>(QStringLiteral("OptOLE(3)")), &QRadioButton::toggled, this, [this](bool on) {
+        if (on && !m_layoutLoaded && isVisible())
+            SetGetLabelDefs(2);
+    });
     connect(ui->txtFromDocNum, &QLineEdit::textChanged, this, &MainCard::txtFromDocNum_Change);
 }
 
@@ -500,7 +510,11 @@ void MainCard::printLabels(int queryType)
     if (code == 6) {
         if (ui->cmbPrinter->currentIndex() >= 0) {
             const QString printer = ui->cmbPrinter->currentText();
-            SetDefaultPrinter(printer);
+            QString error;
+            if (!SetDefaultPrinter(printer, &error)) {
+                m_services.prompt->critical(titles::Fault, error);
+                return;
+            }
             SetBrowserPrinter(printer);
         }
         PrintDirectLabels(uchar(queryType), tempDocs);

@@ -170,9 +170,10 @@ private:
     void printLabels(int queryType);
 
     // Work that other parts of the system do for the commands above.
-    void SetDefaultPrinter(const QString& printer);
+    bool SetDefaultPrinter(const QString& printer, QString* error);
     void SetBrowserPrinter(const QString& printer);
     void PrintDirectLabels(uchar queryType, const QString& dbPath);
+    bool prepareDirectFields(QString* error);
     void ShowItemList(uchar queryType, const QString& dbPath);
     void ImportItems();
     void ImportDocuments();
@@ -190,6 +191,8 @@ private:
     // Set by each document import for the item readers that run by documents.
     QString m_currentDocCriteria;
     QString m_currentItemByDocCriteria;
+    // Whether this control has read the direct-label layout from the store.
+    bool m_layoutLoaded = false;
 };
 
 } // namespace tagora

@@ -39,21 +39,11 @@ int MainCard::ReadStockPriority(const QString&, const QString&, short, const QVa
     return 0;
 }
 
-void MainCard::CreateLabFile(const QString&, const QString&, uchar, uchar) {}
-
 void MainCard::CreateListFile(const QString&, const QString&, uchar, uchar) {}
 
 void MainCard::UpdateDocsAlterKeys(const QString&) {}
 
 // ---- hooks
-
-void MainCard::SetGetLabelDefs(int) {}
-
-void MainCard::SetDefaultPrinter(const QString&) {}
-
-void MainCard::SetBrowserPrinter(const QString&) {}
-
-void MainCard::PrintDirectLabels(uchar, const QString&) {}
 
 void MainCard::ShowItemList(uchar, const QString&) {}
 

@@ -1,11 +1,12 @@
 #include "control/printercatalog.h"
 
+#include "labels/printers.h"
+
 namespace tagora {
 
 std::shared_ptr<PrinterCatalog> systemPrinterCatalog()
 {
-    // Until the print system is wired in, the machine reports no printers.
-    return std::make_shared<FixedPrinterCatalog>();
+    return std::make_shared<CupsPrinterCatalog>();
 }
 
 } // namespace tagora

@@ -12,6 +12,7 @@ class FileDialogProvider;
 class PrinterCatalog;
 class DialogRunner;
 class AutomationRegistry;
+class PageViewer;
 
 // How a modal dialog is shown: on a screen it runs its own event loop; the
 // headless host and the tests drive it from their script instead.
@@ -33,6 +34,8 @@ struct Services {
     // Providers of label programs' automation objects; the journal named in
     // the settings serves every program without one.
     std::shared_ptr<AutomationRegistry> automation;
+    // Where pages the system writes are shown: the user's browser by default.
+    std::shared_ptr<PageViewer> pages;
 };
 
 } // namespace tagora

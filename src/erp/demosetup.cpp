@@ -8,6 +8,8 @@
 #include <QDir>
 #include <QFileInfo>
 
+#include <vector>
+
 #include <odbcinst.h>
 
 namespace tagora {
@@ -56,6 +58,18 @@ QString SetupDemoCompany(const QString& folder, const DemoOptions& options, Sett
     };
     for (const auto& [key, value] : params)
         store.setValue(kSettingsApp, kParamsSection, QLatin1String(key), value);
+    // A direct label to start from: name, barcode, price.
+    const std::pair<const char*, std::vector<std::pair<const char*, const char*>>> layout[] = {
+        {"LabelDef0", {{"UseCell", "-1"}, {"FldID", "1"}, {"ViewType", "0"}, {"FontSize", "10"}, {"FontWeight", "2"}}},
+        {"LabelDef1", {{"UseCell", "-1"}, {"FldID", "4"}, {"ViewType", "1"}}},
+        {"LabelDef2", {{"UseCell", "-1"}, {"FldID", "6"}, {"ViewType", "0"}, {"Prefix", "מחיר:"}}},
+        {"LabelBar", {{"BarType", "2"}, {"DimX", "0.01"}, {"BarHeight", "0.4"}, {"UserResoX", "0"}, {"UserResoY", "0"}, {"ShowDesc", "-1"}}},
+        {"DirectLabel", {{"PageRows", "6"}, {"PageCols", "3"}}},
+    };
+    for (const auto& [section, keys] : layout)
+        for (const auto& [key, value] : keys)
+            if (!store.value(kSettingsApp, QLatin1String(section), QLatin1String(key)))
+                store.setValue(kSettingsApp, QLatin1String(section), QLatin1String(key), QString::fromUtf8(value));
     store.setValue(kSettingsApp, QStringLiteral("GeneralParams"), QStringLiteral("DBPath"),
                    QFileInfo(root.filePath(QStringLiteral("data"))).absoluteFilePath());
     if (!store.flush())

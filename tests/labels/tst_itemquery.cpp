@@ -58,8 +58,8 @@ private slots:
         QTest::addColumn<QString>("key");
         QTest::addColumn<QString>("expected");
         const QString columns = "AccountKey|CardCode|CardName|AlterKey|SpecialPrice|AlterBar|ListPrice";
-        QTest::newRow("no account") << false << "O'Brien" << "NoKey|NoCode|NoName|A1|5|7290000000011|5";
-        QTest::newRow("ticked but empty") << true << "" << "NoKey|NoCode|NoName|A1|5|7290000000011|5";
+        QTest::newRow("no account") << false << "O'Brien" << "NoKey|NoCode|NoName|A1|5|7290000000015|5";
+        QTest::newRow("ticked but empty") << true << "" << "NoKey|NoCode|NoName|A1|5|7290000000015|5";
         QTest::newRow("account with apostrophe") << true << "O'Brien" << "O'Brien|O'Brien|O'Brien|OB-A1|4.5|OBBAR1|4.75";
         QTest::newRow("account without data") << true << "Nobody" << "Nobody|Nobody|Nobody|<null>|<null>|<null>|<null>";
     }

@@ -7,6 +7,7 @@
 #include "control/printercatalog.h"
 #include "control/prompt.h"
 #include "control/settingsstore.h"
+#include "labels/browser.h"
 
 #include <QComboBox>
 #include <QDialog>
@@ -15,6 +16,16 @@
 #include <QStandardPaths>
 #include <QTemporaryDir>
 #include <memory>
+
+// Pages the control would open in a browser, noted instead.
+struct RecordingViewer : tagora::PageViewer {
+    QStringList shown;
+    bool showPage(const QString& path, QString*) override
+    {
+        shown << path;
+        return true;
+    }
+};
 
 // Dialogs opened by a command in a test: each is recorded and handed to the
 // test's callback (if any), then closed, so nothing waits for a user.

@@ -21,7 +21,7 @@ struct LabelData {
         if (!e)
             e = exec(QStringLiteral(
                 "INSERT INTO tItems (ItemKey, ItemName, ItemSort, BarCode, Unit, Price, Coin, Copies, PrintLabel) VALUES"
-                " ('A1', 'Bolt', '10', '7290000000011', 'pc', 5, 'ILS', 2, 1),"
+                " ('A1', 'Bolt', '10', '7290000000015', 'pc', 5, 'ILS', 2, 1),"
                 " ('A2', 'Nut', '10', '72900000000280', 'pc', 1.5, 'ILS', 1, 1),"
                 " ('B1', 'Washer', '20', NULL, 'pc', 0.25, 'ILS', 3, 1),"
                 " ('C9', 'Unmarked', '20', '1', 'pc', 9, 'ILS', 1, 0);"

@@ -1,0 +1,117 @@
+// The control's side of direct labels: the layout, the job, the printers.
+#include "control/maincard.h"
+
+#include "control/prompt.h"
+#include "control/settingsstore.h"
+#include "labels/barcode.h"
+#include "labels/browser.h"
+#include "labels/directlabels.h"
+#include "labels/directlayout.h"
+#include "labels/labelfields.h"
+#include "labels/printers.h"
+
+#include "ui_maincard.h"
+
+#include <QCheckBox>
+#include <QDir>
+#include <QLabel>
+
+namespace tagora {
+
+void MainCard::SetGetLabelDefs(int action)
+{
+    tagora::SetGetLabelDefs(action, directLabelLayout(), *m_services.settings);
+    if (action == 2)
+        m_layoutLoaded = true;
+}
+
+bool MainCard::SetDefaultPrinter(const QString& printer, QString* error)
+{
+    return tagora::SetDefaultPrinter(printer, error);
+}
+
+void MainCard::SetBrowserPrinter(const QString& printer)
+{
+    tagora::SetBrowserPrinter(printer, *m_services.settings);
+}
+
+// Each line in use learns its record column and whether it is a price, and
+// its field is sent, so the label query carries it. This comes before the
+// query is built, so the pictures' query has the column too.
+bool MainCard::prepareDirectFields(QString* error)
+{
+    DirectLabelLayout& layout = directLabelLayout();
+    for (int i = 0; i < kDirectLines; ++i) {
+        LabelLineDef& line = layout.lines[size_t(i)];
+        if (!line.UseCell)
+            continue;
+        if (line.FldID < 0 || line.FldID >= LabelFieldCount) {
+            *error = QStringLiteral("שורה %1 של המדבקה הישירה אינה מוגדרת לשדה").arg(i + 1);
+            return false;
+        }
+        line.FieldName = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(line.FldID))->property("Tag").toString();
+        line.IsPrice = control<QLabel>(QStringLiteral("LblFldName(%1)").arg(line.FldID))->property("Tag").toString()
+            == QLatin1String("2");
+        control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(line.FldID))->setChecked(true);
+    }
+    return true;
+}
+
+void MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
+{
+    QString error;
+    if (prepareDirectFields(&error))
+        error = CreateLabPage(pFileName, pDBName, BuildItemQuery(pQueryType, pOrderBy).toString(), directLabelLayout(),
+                              ui->txtPriceFormat->text(), this);
+    if (!error.isEmpty())
+        m_services.prompt->critical(titles::Fault, error);
+}
+
+void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
+{
+    auto fail = [this](const QString& error) { m_services.prompt->critical(titles::Fault, error); };
+    QString error;
+    if (!prepareDirectFields(&error))
+        return fail(error);
+    const DirectLabelLayout& layout = directLabelLayout();
+    const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
+    const QString sql = BuildItemQuery(queryType, order).toString();
+    const QString folder = directJobFolder();
+    if (!(error = PrepareJobFolder(folder)).isEmpty())
+        return fail(error);
+
+    LabelBarDef bar = layout.bar;
+    QVector<BarcodeRefusal> refused;
+    if (bar.BarType >= 0) {
+        ZintBarcodeLibrary library;
+        for (const LabelLineDef& line : layout.lines) {
+            if (line.ViewType != 1 || !line.UseCell || line.FldID < 0)
+                continue;
+            error = MakeBarcodeImages(folder, line.FieldName, line.FldID, dbPath, sql, bar, library, &refused);
+            if (!error.isEmpty())
+                return fail(error);
+        }
+    }
+    const QString page = QDir(folder).filePath(QStringLiteral("tgrlab1.htm"));
+    error = CreateLabPage(page, dbPath, sql, layout, ui->txtPriceFormat->text(), this);
+    if (!error.isEmpty())
+        return fail(error);
+    if (!m_services.pages->showPage(page, &error))
+        return fail(error);
+
+    // A value the barcode cannot carry gets no picture rather than a wrong
+    // one; the user learns which labels lack theirs.
+    if (!refused.isEmpty()) {
+        QStringList lines;
+        for (const BarcodeRefusal& r : refused.mid(0, 10))
+            lines << QStringLiteral("רשומה %1: '%2' - %3").arg(r.record).arg(r.data, r.reason);
+        if (refused.size() > 10)
+            lines << QStringLiteral("ועוד %1").arg(refused.size() - 10);
+        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention,
+                                   QStringLiteral("%1 מדבקות הודפסו ללא ברקוד, כי לא ניתן לקודד את הערך בסוג הברקוד שנבחר:\n")
+                                           .arg(refused.size())
+                                       + lines.join(QLatin1Char('\n')));
+    }
+}
+
+} // namespace tagora

@@ -1,0 +1,393 @@
+#include "labels/directlabels.h"
+
+#include "control/progress.h"
+#include "erp/textconv.h"
+#include "labels/barcode.h"
+#include "labels/numberformat.h"
+#include "localdb/database.h"
+
+#include <QDir>
+#include <QFile>
+#include <QFileInfo>
+#include <QStringEncoder>
+
+namespace tagora {
+
+namespace {
+const char* const kFonts[] = {"Arial (Hebrew)", "David", "Miriam"};
+const char* const kWeights[] = {"Normal", "Bolder", "Bold"};
+const char* const kAligns[] = {"Right", "Center", "Left"};
+const char* const kDirections[] = {"ltr", "rtl"};
+
+template <size_t N> QString nameOf(const char* const (&names)[N], int i)
+{
+    return i >= 0 && i < int(N) ? QLatin1String(names[i]) : QString();
+}
+
+QString escaped(const QString& text)
+{
+    return text.toHtmlEscaped().replace(QLatin1Char('\''), QLatin1String("&#39;"));
+}
+
+// The page's lines, in the code page it declares, each with CRLF. A character
+// the code page lacks goes as a numeric reference rather than a question mark.
+class PageWriter {
+public:
+    explicit PageWriter(const QString& path)
+        : m_file(path)
+    {
+    }
+
+    bool open() { return m_file.open(QIODevice::WriteOnly | QIODevice::Truncate); }
+    QString error() const { return m_file.errorString(); }
+
+    void line(const QString& text) { write(text + QStringLiteral("\r\n")); }
+
+    void write(const QString& text)
+    {
+        QByteArray bytes = m_encoder.encode(text);
+        if (m_encoder.hasError()) {
+            bytes.clear();
+            for (int i = 0; i < text.size(); ++i) {
+                const bool pair = text[i].isHighSurrogate() && i + 1 < text.size();
+                const QString one = pair ? text.mid(i, 2) : text.mid(i, 1);
+                QStringEncoder single("windows-1255");
+                QByteArray b = single.encode(one);
+                if (single.hasError())
+                    b = "&#" + QByteArray::number(one.toUcs4().value(0)) + ';';
+                bytes += b;
+                if (pair)
+                    ++i;
+            }
+            m_encoder.resetState();
+        }
+        if (m_file.write(bytes) != bytes.size())
+            m_failed = true;
+    }
+
+    bool close()
+    {
+        m_file.close();
+        return !m_failed && m_file.error() == QFileDevice::NoError;
+    }
+
+private:
+    QFile m_file;
+    QStringEncoder m_encoder{"windows-1255"};
+    bool m_failed = false;
+};
+
+QString pictureAttributes(const LabelBarDef& bar)
+{
+    QString a = QStringLiteral(" ");
+    if (bar.UserResoX > 0)
+        a += QStringLiteral(" width=") + QString::number(bar.UserResoX);
+    if (bar.UserResoY > 0)
+        a += QStringLiteral(" height=") + QString::number(bar.UserResoY);
+    return a;
+}
+
+int copiesOf(const QVariant& v)
+{
+    // A record without copies prints none, and the job goes on.
+    if (!v.isValid() || v.isNull())
+        return 0;
+    bool ok = false;
+    const double d = v.toString().trimmed().toDouble(&ok);
+    if (!ok || !std::isfinite(d) || d < 1)
+        return 0;
+    return d > 1e6 ? 1000000 : int(std::nearbyint(d));
+}
+
+QString lineText(const LabelLineDef& line, int index, const Statement& record, int column, const QString& priceFormat,
+                 int coinColumn, int maxTextLen)
+{
+    const QVariant value = column >= 0 ? record.value(column) : QVariant();
+    QString text;
+    if (value.isValid() && !value.isNull()) {
+        if (line.IsPrice)
+            text = FormatNumber(value, priceFormat) + QLatin1Char(' ')
+                + (coinColumn >= 0 ? record.value(coinColumn).toString() : QString());
+        else
+            text = value.toString();
+    }
+    if (!line.Prefix.isEmpty())
+        text = line.Prefix + QLatin1Char(' ') + text;
+    if (maxTextLen > 0 && text.size() > maxTextLen)
+        text = text.left(maxTextLen);
+    if (line.FieldName.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0)
+        return LetterTable(text, QStringLiteral("L%1").arg(index));
+    return escaped(text);
+}
+} // namespace
+
+QString cellPercent(int count)
+{
+    QString t = QString::number(100.0 / count, 'f', 1);
+    if (t.indexOf(QLatin1Char('.')) < 2)
+        t.prepend(QLatin1Char('0'));
+    return t;
+}
+
+QString directJobFolder()
+{
+    QString temp = qEnvironmentVariable("Temp");
+    if (temp.isEmpty())
+        temp = QDir::tempPath();
+    return QDir(temp).filePath(QStringLiteral("tgrlab"));
+}
+
+QString PrepareJobFolder(const QString& folder)
+{
+    QDir dir(folder);
+    if (!dir.exists()) {
+        if (!QDir().mkpath(folder))
+            return QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(QDir::toNativeSeparators(folder));
+        return QString();
+    }
+    for (const QString& name : dir.entryList(QDir::Files | QDir::Hidden | QDir::System))
+        if (!dir.remove(name))
+            return QStringLiteral("לא ניתן למחוק את הקובץ '%1'").arg(QDir::toNativeSeparators(dir.filePath(name)));
+    return QString();
+}
+
+QString MakeBarcodeImages(const QString& folder, const QString& column, int fieldIndex, const QString& dbPath,
+                          const QString& sql, LabelBarDef& bar, BarcodeLibrary& library,
+                          QVector<BarcodeRefusal>* refusals)
+{
+    Database db;
+    DbError e = db.open(dbPath, Database::OpenMode::ReadOnly);
+    Statement records;
+    if (!e)
+        records = db.prepare(sql, &e);
+    if (e)
+        return e.message;
+    Statement::Step step = records.step();
+    if (step == Statement::Step::Error)
+        return records.error().message;
+    if (step == Statement::Step::Done)
+        return QString();
+    const int col = records.columnIndex(column);
+    if (col < 0)
+        return QStringLiteral("העמודה %1 אינה ברשומת המדבקה").arg(column);
+    const int code = libraryBarType(bar.BarType, bar);
+    const int handle = library.A1OpenInstance();
+    int record = 0;
+    QString failure;
+    for (; step == Statement::Step::Row; step = records.step()) {
+        ++record;
+        const QVariant value = records.value(col);
+        // Only text makes a picture: a number or nothing leaves the cell empty.
+        if (value.metaType().id() != QMetaType::QString || value.toString().isEmpty())
+            continue;
+        QString data = value.toString();
+        if (bar.LeftLen > 0)
+            data = data.left(bar.LeftLen);
+        if (!bar.LeftPrefix.isEmpty())
+            data = bar.LeftPrefix + data;
+        QString reason;
+        if (!DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
+                         &reason)
+            && refusals)
+            refusals->push_back({record, data, reason});
+    }
+    if (step == Statement::Step::Error)
+        failure = records.error().message;
+    library.A1CloseInstance(handle);
+    return failure;
+}
+
+QStringList WriteLabelStyles(const DirectLabelLayout& layout)
+{
+    QStringList out;
+    for (int i = 0; i < kDirectLines; ++i) {
+        const LabelLineDef& l = layout.lines[size_t(i)];
+        if (!l.UseCell)
+            continue;
+        QString rule = QStringLiteral("       .L%1").arg(i);
+        rule += QStringLiteral(" {font-family:") + nameOf(kFonts, l.Font);
+        rule += QStringLiteral("; font-weight:") + nameOf(kWeights, l.FontWeight);
+        rule += QStringLiteral("; font-size:%1pt").arg(l.FontSize);
+        rule += QStringLiteral("; font-style:") + (l.FontItalic ? QStringLiteral("Italic") : QStringLiteral("Normal"));
+        if (l.FontUL)
+            rule += QStringLiteral("; text-decoration: underline");
+        rule += QStringLiteral("; text-align:") + nameOf(kAligns, l.Align);
+        rule += QStringLiteral("; direction:") + nameOf(kDirections, l.Direction);
+        if (l.Height > 0)
+            rule += QStringLiteral("; height: %1pt").arg(l.Height);
+        if (l.Border)
+            rule += QStringLiteral("; border: thin solid black");
+        rule += QStringLiteral("; color:black;}");
+        out << rule;
+    }
+    out << QStringLiteral("       TR {vertical-align: middle; }") << QStringLiteral("       TD {vertical-align: middle; }")
+        << QStringLiteral("       TABLE {border: none; direction: rtl; padding: 0; word-spacing: 0; letter-spacing: 0}")
+        << QStringLiteral("       .Lab {border: none; direction: rtl; padding: 1; word-spacing: 0; letter-spacing: 0; "
+                          "margin-top: %1; margin-bottom: %2}")
+               .arg(layout.page.LabTop)
+               .arg(layout.page.LabBottom);
+    return out;
+}
+
+QString LetterTable(const QVariant& value, const QString& className)
+{
+    const QString text = value.isValid() && !value.isNull() ? value.toString() : QString();
+    QString out = QStringLiteral("<table");
+    if (!className.isEmpty())
+        out += QStringLiteral(" class='") + className + QLatin1Char('\'');
+    out += QStringLiteral(" cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>");
+    QString previous;
+    for (const QChar c : text) {
+        if (c == kCellSeparator)
+            continue;
+        const QString cell = c == QLatin1Char(' ') ? QStringLiteral("&nbsp;") : escaped(QString(c));
+        if (!(cell == QLatin1String("&nbsp;") && previous == QLatin1String("&nbsp;")))
+            out += QStringLiteral("<td>") + cell + QStringLiteral("</td>");
+        previous = cell;
+    }
+    return out + QStringLiteral("</tr></table>");
+}
+
+QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
+                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress)
+{
+    const LabelPageDef& page = layout.page;
+    if (page.PageRows <= 0 || page.PageCols <= 0)
+        return QStringLiteral("מבנה דף המדבקות אינו תקין: %1 שורות, %2 מדבקות בשורה").arg(page.PageRows).arg(page.PageCols);
+    const QString height = QStringLiteral("height='") + cellPercent(page.PageRows) + QStringLiteral("%'");
+    const QString width = QStringLiteral("width='") + cellPercent(page.PageCols) + QStringLiteral("%'");
+    const QString picture = pictureAttributes(layout.bar);
+    const QString format = priceFormat.trimmed().isEmpty() ? QStringLiteral("0.00") : priceFormat.trimmed();
+
+    QFile::remove(fileName);
+    PageWriter out(fileName);
+    if (!out.open())
+        return out.error();
+    out.line(QStringLiteral("<HTML>"));
+    out.line(QStringLiteral("<HEAD>"));
+    out.line(QStringLiteral("<TITLE>מדבקות פריטים</TITLE>"));
+    out.line(QStringLiteral("<meta http-equiv='Content-Type' content='text/html; charset=windows-1255'>"));
+    out.line(QStringLiteral("<style>"));
+    for (const QString& rule : WriteLabelStyles(layout))
+        out.line(rule);
+    out.line(QStringLiteral("</style>"));
+    out.line(QStringLiteral("</HEAD>"));
+    out.write(QStringLiteral("<BODY"));
+    if (page.PageAutoPrint)
+        out.line(QStringLiteral(" onload='window.print()'"));
+    out.line(QStringLiteral(" BGCOLOR='#FFFFFF'>"));
+
+    Database db;
+    DbError e = db.open(dbPath, Database::OpenMode::ReadOnly);
+    // First pass: how many labels, for the number of pages.
+    long long total = 0;
+    bool anyRecord = false;
+    if (!e) {
+        Statement first = db.prepare(sql, &e);
+        const int copies = first.columnIndex(QStringLiteral("Copies"));
+        Statement::Step s;
+        while (!e && (s = first.step()) == Statement::Step::Row) {
+            anyRecord = true;
+            total += copiesOf(copies >= 0 ? first.value(copies) : QVariant());
+        }
+        if (!e && s == Statement::Step::Error)
+            e = first.error();
+        if (!e && copies < 0 && first.columnCount() > 0)
+            e = DbError::other(QStringLiteral("העמודה Copies אינה ברשומת המדבקה"));
+    }
+    if (e) {
+        out.close();
+        return e.message;
+    }
+    // No records: the page ends after its body tag.
+    if (!anyRecord)
+        return out.close() ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+    const long long perPage = (long long)page.PageRows * page.PageCols;
+    const long long pages = (total + perPage - 1) / perPage;
+
+    Statement records = db.prepare(sql, &e);
+    if (e) {
+        out.close();
+        return e.message;
+    }
+    if (progress)
+        progress->setProgress(0);
+    std::array<int, kDirectLines> columns{};
+    for (int i = 0; i < kDirectLines; ++i)
+        columns[size_t(i)] = records.columnIndex(layout.lines[size_t(i)].FieldName);
+    const int copiesColumn = records.columnIndex(QStringLiteral("Copies"));
+    const int coinColumn = records.columnIndex(QStringLiteral("CoinSign"));
+
+    // The current record, moved past records that print no label.
+    bool more = false;
+    int copies = 0;
+    long long recordNumber = 0;
+    auto next = [&] {
+        for (;;) {
+            const Statement::Step s = records.step();
+            if (s != Statement::Step::Row) {
+                if (s == Statement::Step::Error)
+                    e = records.error();
+                more = false;
+                return;
+            }
+            ++recordNumber;
+            copies = copiesOf(records.value(copiesColumn));
+            if (copies > 0) {
+                more = true;
+                return;
+            }
+        }
+    };
+    next();
+    int counter = 0;
+    for (long long p = 1; p <= pages && !e; ++p) {
+        out.line(QStringLiteral("<table height='100%' width='100%' border='0'>"));
+        for (int r = 1; r <= page.PageRows; ++r) {
+            out.line(QStringLiteral("  <tr>"));
+            for (int c = 1; c <= page.PageCols; ++c) {
+                out.line(QStringLiteral("    <td ") + width + QLatin1Char(' ') + height + QStringLiteral(" align='center'>"));
+                out.line(QStringLiteral("     <table class=Lab border='0'>"));
+                if (!more) {
+                    out.line(QStringLiteral("    <tr><td nowrap>&nbsp;</td></tr>"));
+                } else {
+                    for (int i = 0; i < kDirectLines; ++i) {
+                        const LabelLineDef& l = layout.lines[size_t(i)];
+                        if (!l.UseCell)
+                            continue;
+                        if (l.ViewType == 1)
+                            out.line(QStringLiteral("    <tr align='center'><td class='L%1'><img src='").arg(i)
+                                     + BarcodeImageName(l.FldID, int(recordNumber)) + QLatin1Char('\'') + picture
+                                     + QStringLiteral("></img></td></tr>"));
+                        else if (l.ViewType == 0)
+                            out.line(QStringLiteral("    <tr align='center'><td class='L%1'>").arg(i)
+                                     + lineText(l, i, records, columns[size_t(i)], format, coinColumn, page.MaxTextLen)
+                                     + QStringLiteral("</td></tr>"));
+                    }
+                    if (++counter >= copies) {
+                        counter = 0;
+                        next();
+                    }
+                }
+                out.line(QStringLiteral("     </table>"));
+                out.line(QStringLiteral("    </td>"));
+            }
+            out.line(QStringLiteral("  </tr>"));
+        }
+        out.line(QStringLiteral("</table>"));
+        if (progress && recordNumber % 5 == 0 && total > 0)
+            progress->setProgress(double(recordNumber) / double(total));
+    }
+    if (!e) {
+        out.line(QStringLiteral("</BODY>"));
+        out.line(QStringLiteral("</HTML>"));
+    }
+    const bool written = out.close();
+    if (progress)
+        progress->setProgress(0);
+    if (e)
+        return e.message;
+    return written ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+}
+
+} // namespace tagora

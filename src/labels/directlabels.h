@@ -1,0 +1,53 @@
+#pragma once
+
+#include "labels/directlayout.h"
+
+#include <QString>
+#include <QStringList>
+#include <QVariant>
+#include <QVector>
+
+namespace tagora {
+
+class ProgressSink;
+class BarcodeLibrary;
+
+// The folder of a direct-label job: the temporary folder ("Temp" when set)
+// followed by "tgrlab".
+QString directJobFolder();
+// Empties (or makes) the job folder; empty text on success.
+QString PrepareJobFolder(const QString& folder);
+
+// A record whose barcode the symbology cannot encode: it gets no picture.
+struct BarcodeRefusal {
+    int record = 0;
+    QString data;
+    QString reason;
+};
+
+// The pictures of one barcode line, one per record with a text value, named
+// by field index and record number. Empty text on success; refusals of the
+// symbology are collected, not fatal.
+QString MakeBarcodeImages(const QString& folder, const QString& column, int fieldIndex, const QString& dbPath,
+                          const QString& sql, LabelBarDef& bar, BarcodeLibrary& library,
+                          QVector<BarcodeRefusal>* refusals);
+
+// The style rules of the page, one line each.
+QStringList WriteLabelStyles(const DirectLabelLayout& layout);
+
+// A text as a one-row table with a cell per character, so that its order
+// holds whatever the browser's direction rules; characters are escaped,
+// blanks are &nbsp; (a run of blanks one cell), cell separators dropped.
+QString LetterTable(const QVariant& value, const QString& className);
+
+// Writes the page of labels for the records of sql on dbPath: Windows-1255
+// (characters it lacks as numeric references), CRLF, a grid of labels per
+// printed page. The layout's lines must carry their FieldName and IsPrice.
+// Empty text on success.
+QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
+                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress);
+
+// The cell size attribute value for n rows or columns: 100 / n with one decimal, at least two digits.
+QString cellPercent(int count);
+
+} // namespace tagora

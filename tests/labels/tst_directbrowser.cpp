@@ -1,0 +1,90 @@
+// The page of the demo company's labels as a browser shows it: rendered by
+// headless Chromium, and every barcode on it read back by a barcode reader.
+#include "support/cardfixture.h"
+#include "support/dbrows.h"
+#include "support/erpfixture.h"
+
+#include "erp/connparams.h"
+#include "erp/itemimport.h"
+#include "labels/browser.h"
+#include "labels/directlayout.h"
+#include "localdb/schema.h"
+
+#include <QProcess>
+#include <QPushButton>
+#include <QtTest>
+
+using namespace tagora;
+
+class TestDirectBrowser : public QObject {
+    Q_OBJECT
+    OdbcSandbox odbc;
+    QTemporaryDir work;
+
+private slots:
+    void barcodesReadBackFromTheRenderedPage()
+    {
+        const QString chromium = QStandardPaths::findExecutable("chromium");
+        const QString zbarimg = QStandardPaths::findExecutable("zbarimg");
+        QVERIFY2(!chromium.isEmpty() && !zbarimg.isEmpty(), "chromium and zbarimg are installed by the setup");
+
+        DemoOptions o;
+        odbc.addDemo("TagoraPage", o);
+        const QString data = work.filePath("data");
+        QVERIFY(!PrepareDataFolder(data));
+        ReadError e;
+        const ErpReadContext ctx{BuildConnString("TagoraPage", "sa", QVariant(), "", 2)};
+        QVERIFY(ReadItemPriority(ctx, data + "/" + dbfiles::Items, {}, {}, false, 1, 1, false, false, &e));
+        DbError de;
+        QVERIFY(!CreateTempDocsDB(data + "/" + dbfiles::Config, data + "/" + dbfiles::Items, data + "/" + dbfiles::TempDocs, &de).isEmpty());
+        {
+            Database d;
+            QVERIFY(!d.open(data + "/" + dbfiles::Items));
+            QVERIFY(!d.exec("UPDATE tItems SET PrintLabel = 1, Copies = 1"));
+        }
+        const QStringList expected = rows(data + "/" + dbfiles::Items,
+                                          "SELECT 'CODE-128:' || BarCode FROM tItems WHERE BarCode <> '' ORDER BY 1");
+        QVERIFY(expected.size() > 10);
+
+        // One page tall enough for every label: a barcode, the name, the price.
+        const QString temp = work.filePath("temp");
+        qputenv("Temp", temp.toUtf8());
+        CardFixture f(QStringLiteral("[GeneralParams]\nDBPath=%1\nOptOLE3=True\nOptOLE0=False\n"
+                                     "[LabelDef0]\nUseCell=-1\nFldID=1\n"
+                                     "[LabelDef1]\nUseCell=-1\nFldID=4\nViewType=1\n"
+                                     "[LabelDef2]\nUseCell=-1\nFldID=6\nPrefix=מחיר:\n"
+                                     "[LabelBar]\nBarType=2\nDimX=0.01\nBarHeight=0.3\nUserResoX=0\nUserResoY=0\nShowDesc=-1\n"
+                                     "[DirectLabel]\nPageRows=20\nPageCols=3\n").arg(data).toUtf8());
+        auto viewer = std::make_shared<RecordingViewer>();
+        Services s = f.card->services();
+        s.pages = viewer;
+        MainCard card(nullptr, s);
+        card.show();
+        f.prompt->clear();
+        card.control<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
+        QCOMPARE(viewer->shown.size(), 1);
+        qunsetenv("Temp");
+        directLabelLayout() = DirectLabelLayout{};
+
+        const QString png = work.filePath("page.png");
+        QProcess browser;
+        browser.start(chromium, {"--headless", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run",
+                                 "--disable-background-networking", "--disable-component-update", "--disable-sync",
+                                 "--hide-scrollbars", "--user-data-dir=" + work.filePath("profile"),
+                                 "--window-size=1100,4200", "--screenshot=" + png,
+                                 QUrl::fromLocalFile(viewer->shown.first()).toString()});
+        QVERIFY(browser.waitForFinished(120000));
+        QVERIFY2(QFile::exists(png), browser.readAllStandardError().right(800).constData());
+
+        QProcess reader;
+        reader.start(zbarimg, {"-q", png});
+        QVERIFY(reader.waitForFinished(60000));
+        QStringList decoded = QString::fromUtf8(reader.readAllStandardOutput()).split('\n', Qt::SkipEmptyParts);
+        decoded.sort();
+        QCOMPARE(decoded, expected);
+    }
+};
+
+QTEST_MAIN(TestDirectBrowser)
+#include "tst_directbrowser.moc"

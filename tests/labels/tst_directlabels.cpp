@@ -1,0 +1,316 @@
+// The direct-label page, its pictures and the job as the print button runs it.
+#include "support/cardfixture.h"
+#include "support/labeldata.h"
+
+#include "erp/textconv.h"
+#include "labels/barcode.h"
+#include "labels/browser.h"
+#include "labels/directlabels.h"
+#include "labels/directlayout.h"
+#include "labels/itemquery.h"
+
+#include <QCheckBox>
+#include <QLineEdit>
+#include <QPushButton>
+#include <QRadioButton>
+#include <QStringDecoder>
+#include <QtTest>
+
+using namespace tagora;
+
+namespace {
+QString readPage(const QString& path)
+{
+    QFile f(path);
+    f.open(QIODevice::ReadOnly);
+    return QStringDecoder("windows-1255").decode(f.readAll());
+}
+
+LabelLineDef textLine(short field, const QString& column, const QString& prefix = {}, bool price = false)
+{
+    LabelLineDef l;
+    l.UseCell = true;
+    l.FldID = field;
+    l.FieldName = column;
+    l.Prefix = prefix;
+    l.IsPrice = price;
+    return l;
+}
+} // namespace
+
+class TestDirectLabels : public QObject {
+    Q_OBJECT
+    QTemporaryDir work;
+    int pages = 0;
+
+    // A page for the items of `range`, with their copies, in key order.
+    QString page(const LabelData& data, const DirectLabelLayout& layout, const QString& range,
+                 const QString& format = "0.00")
+    {
+        LabelQuerySettings q;
+        q.itemRangeCriteria = range;
+        q.sent.fill(true);
+        for (int i = 33; i < 38; ++i)
+            q.expressions[size_t(i)] = "1";
+        const QString file = work.filePath(QStringLiteral("page%1.htm").arg(++pages));
+        const QString error = CreateLabPage(file, data.docs, BuildItemQuery(q, 1, 1), layout, format, nullptr);
+        return error.isEmpty() ? readPage(file) : "error: " + error;
+    }
+
+private slots:
+    // 2, 1 and 4 copies on a 2 x 2 page: seven labels on two pages, the last cell empty.
+    void copiesFillPages()
+    {
+        LabelData data("UPDATE tItems SET Copies = CASE ItemKey WHEN 'A1' THEN 2 WHEN 'A2' THEN 1 ELSE 4 END");
+        DirectLabelLayout layout;
+        layout.page.PageRows = 2;
+        layout.page.PageCols = 2;
+        layout.lines[0] = textLine(0, "ItemKey");
+        layout.lines[1] = textLine(4, "BarCode");
+        layout.lines[1].ViewType = 1;
+        const QString html = page(data, layout, " And ItemKey <= 'B1'");
+        QCOMPARE(html.count("<table height='100%' width='100%' border='0'>"), 2);
+        QCOMPARE(html.count("<td class='L0'>"), 7);
+        QCOMPARE(html.count("<tr><td nowrap>&nbsp;</td></tr>"), 1);
+        QVERIFY(html.lastIndexOf("&nbsp;</td></tr>") > html.lastIndexOf("<td class='L0'>"));
+        // One picture name per record, however many copies.
+        QCOMPARE(html.count("B0400003.BMP"), 4);
+        QCOMPARE(html.count("B0400001.BMP"), 2);
+        QCOMPARE(html.count("\r\n"), html.count('\n'));
+        QVERIFY(html.endsWith("</BODY>\r\n</HTML>\r\n"));
+    }
+
+    // Copies beyond a byte, and none at all, neither stop nor shorten the page.
+    void unusualCopies()
+    {
+        LabelData data("UPDATE tItems SET Copies = CASE ItemKey WHEN 'A1' THEN 300 WHEN 'A2' THEN NULL ELSE 0 END");
+        DirectLabelLayout layout;
+        layout.lines[0] = textLine(0, "ItemKey");
+        const QString html = page(data, layout, " And ItemKey <= 'B1'");
+        QCOMPARE(html.count("<td class='L0'>A1</td>"), 300);
+        QVERIFY(!html.contains("<td class='L0'>A2</td>"));
+        QVERIFY(!html.contains("<td class='L0'>B1</td>"));
+        QCOMPARE(html.count("<table height='100%'"), 13); // 300 labels, 24 to a page
+    }
+
+    void cellText_data()
+    {
+        QTest::addColumn<QString>("prefix");
+        QTest::addColumn<int>("maxLen");
+        QTest::addColumn<QString>("value");
+        QTest::addColumn<bool>("price");
+        QTest::addColumn<QString>("format");
+        QTest::addColumn<QString>("cell");
+        QTest::newRow("prefix counts in the cut") << "ab" << 5 << "12345" << false << "" << "ab 12";
+        QTest::newRow("prefix of an empty value") << "ab" << 0 << "" << false << "" << "ab ";
+        QTest::newRow("price with its sign") << "" << 0 << "3.5" << true << "" << "3.50 $";
+        QTest::newRow("price pattern") << "" << 0 << "1234.5" << true << "#,##0.00" << "1,234.50 $";
+        QTest::newRow("markup is text") << "" << 0 << "<b>&'x'" << false << "" << "&lt;b&gt;&amp;&#39;x&#39;";
+        QTest::newRow("hebrew") << "" << 0 << "בורג" << false << "" << "בורג";
+    }
+    void cellText()
+    {
+        QFETCH(QString, prefix);
+        QFETCH(int, maxLen);
+        QFETCH(QString, value);
+        QFETCH(bool, price);
+        QFETCH(QString, format);
+        QFETCH(QString, cell);
+        LabelData data(QStringLiteral("UPDATE tItems SET ItemName = '%1', Coin = '$', Copies = 1 WHERE ItemKey = 'A1'")
+                           .arg(QString(value).replace("'", "''")));
+        DirectLabelLayout layout;
+        layout.page.MaxTextLen = short(maxLen);
+        layout.lines[3] = textLine(1, "ItemName", prefix, price);
+        const QString html = page(data, layout, " And ItemKey = 'A1'", format);
+        QVERIFY2(html.contains("<td class='L3'>" + cell + "</td>"), qPrintable(html.section("<td class='L3'>", 1, 1).left(60)));
+    }
+
+    void pageShape_data()
+    {
+        QTest::addColumn<int>("rows");
+        QTest::addColumn<int>("cols");
+        QTest::addColumn<bool>("autoPrint");
+        QTest::addColumn<int>("resoX");
+        QTest::addColumn<int>("resoY");
+        QTest::addColumn<QStringList>("expected");
+        QTest::newRow("4 by 6") << 6 << 4 << false << 100 << 0
+                                << QStringList{"<td width='25.0%' height='16.7%' align='center'>", "<BODY BGCOLOR='#FFFFFF'>\r\n",
+                                               "<img src='B0400001.BMP'  width=100></img>"};
+        QTest::newRow("one column, printing itself") << 12 << 1 << true << 0 << 40
+                                                     << QStringList{"<td width='100.0%' height='08.3%' align='center'>",
+                                                                    "<BODY onload='window.print()'\r\n BGCOLOR='#FFFFFF'>\r\n",
+                                                                    "<img src='B0400001.BMP'  height=40></img>"};
+    }
+    void pageShape()
+    {
+        QFETCH(int, rows);
+        QFETCH(int, cols);
+        QFETCH(bool, autoPrint);
+        QFETCH(int, resoX);
+        QFETCH(int, resoY);
+        QFETCH(QStringList, expected);
+        LabelData data;
+        DirectLabelLayout layout;
+        layout.page.PageRows = short(rows);
+        layout.page.PageCols = short(cols);
+        layout.page.PageAutoPrint = autoPrint;
+        layout.bar.UserResoX = short(resoX);
+        layout.bar.UserResoY = short(resoY);
+        layout.lines[0] = textLine(4, "BarCode");
+        layout.lines[0].ViewType = 1;
+        const QString html = page(data, layout, " And ItemKey = 'A1'");
+        for (const QString& e : expected)
+            QVERIFY2(html.contains(e), qPrintable(e));
+    }
+
+    void emptyQueryEndsAfterBody()
+    {
+        LabelData data;
+        DirectLabelLayout layout;
+        layout.lines[0] = textLine(0, "ItemKey");
+        QVERIFY(page(data, layout, " And ItemKey = 'none'").endsWith(" BGCOLOR='#FFFFFF'>\r\n"));
+        layout.page.PageRows = 0;
+        QVERIFY(page(data, layout, "").startsWith("error: "));
+    }
+
+    void styles()
+    {
+        DirectLabelLayout layout;
+        layout.lines[2] = textLine(1, "ItemName");
+        layout.lines[2].Font = 1;
+        layout.lines[2].FontWeight = 2;
+        layout.lines[2].FontSize = 12;
+        layout.lines[2].FontItalic = true;
+        layout.lines[2].FontUL = true;
+        layout.lines[2].Align = 0;
+        layout.lines[2].Direction = 0;
+        layout.lines[2].Height = 14;
+        layout.lines[2].Border = true;
+        layout.page.LabTop = 3;
+        const QStringList rules = WriteLabelStyles(layout);
+        QCOMPARE(rules.first(), QString("       .L2 {font-family:David; font-weight:Bold; font-size:12pt; font-style:Italic; "
+                                        "text-decoration: underline; text-align:Right; direction:ltr; height: 14pt; "
+                                        "border: thin solid black; color:black;}"));
+        QCOMPARE(rules.size(), 5);
+        QVERIFY(rules.last().endsWith("margin-top: 3; margin-bottom: 0}"));
+    }
+
+    void letterTable_data()
+    {
+        QTest::addColumn<QVariant>("value");
+        QTest::addColumn<QString>("cls");
+        QTest::addColumn<QString>("cells");
+        const QString sep(kCellSeparator);
+        QTest::newRow("run of blanks is one cell") << QVariant("a  b") << "L2" << "<td>a</td><td>&nbsp;</td><td>b</td>";
+        QTest::newRow("separators dropped") << QVariant(sep + "x" + sep + "<" + sep) << "" << "<td>x</td><td>&lt;</td>";
+        QTest::newRow("null") << QVariant() << "L1" << "";
+    }
+    void letterTable()
+    {
+        QFETCH(QVariant, value);
+        QFETCH(QString, cls);
+        QFETCH(QString, cells);
+        const QString open = cls.isEmpty() ? QString("<table") : "<table class='" + cls + "'";
+        QCOMPARE(LetterTable(value, cls), open + " cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>"
+                                              + cells + "</tr></table>");
+    }
+
+    void codePage()
+    {
+        LabelData data("UPDATE tItems SET ItemName = 'שלום ش €' WHERE ItemKey = 'A1'");
+        DirectLabelLayout layout;
+        layout.lines[0] = textLine(1, "ItemName");
+        page(data, layout, " And ItemKey = 'A1'");
+        QFile f(work.filePath(QStringLiteral("page%1.htm").arg(pages)));
+        QVERIFY(f.open(QIODevice::ReadOnly));
+        const QByteArray bytes = f.readAll();
+        QVERIFY(bytes.contains(QByteArray("\xf9\xec\xe5\xed &#1588; \x80")));
+    }
+
+    // Pictures: one per record with a value; a value the symbology refuses gets none and is reported.
+    void pictures()
+    {
+        LabelData data("UPDATE tItems SET BarCode = '729000000001X' WHERE ItemKey = 'A2'");
+        const QString folder = work.filePath("pictures");
+        QVERIFY(PrepareJobFolder(folder).isEmpty());
+        LabelBarDef bar;
+        bar.BarType = 6; // EAN-13
+        LabelQuerySettings q;
+        q.itemRangeCriteria = " And ItemKey <= 'B1'";
+        ZintBarcodeLibrary library;
+        QVector<BarcodeRefusal> refused;
+        QVERIFY(MakeBarcodeImages(folder, "BarCode", 4, data.docs, BuildItemQuery(q, 1, 1), bar, library, &refused).isEmpty());
+        QVERIFY(QFile::exists(folder + "/B0400001.BMP"));
+        QVERIFY(!QFile::exists(folder + "/B0400002.BMP"));
+        QVERIFY(!QFile::exists(folder + "/B0400003.BMP")); // no barcode at all
+        QCOMPARE(refused.size(), 1);
+        QCOMPARE(refused.first().record, 2);
+        // The folder is emptied for the next job.
+        QVERIFY(PrepareJobFolder(folder).isEmpty());
+        QVERIFY(QDir(folder).entryList(QDir::Files).isEmpty());
+    }
+
+    void layoutInSettings()
+    {
+        QTemporaryDir d;
+        IniSettingsStore store(d.filePath("s.ini"));
+        DirectLabelLayout layout;
+        SetGetLabelDefs(2, layout, store);
+        QCOMPARE(layout.page.PageRows, short(6));
+        QCOMPARE(layout.bar.UserResoX, short(100));
+        QVERIFY(layout.bar.CheckDigit);
+        layout.lines[4] = textLine(31, "SalPackUN", "יח'");
+        layout.bar.DimX = 0.02f;
+        SetGetLabelDefs(1, layout, store);
+        QCOMPARE(store.value("Tagora", "LabelDef4", "UseCell").value_or("?"), QString("-1"));
+        QCOMPARE(store.value("Tagora", "LabelBar", "DimX").value_or("?"), QString("0.02"));
+        store.setValue("Tagora", "LabelDef4", "Border", "True");
+        store.setValue("Tagora", "LabelDef4", "FontSize", "huge");
+        DirectLabelLayout back;
+        SetGetLabelDefs(2, back, store);
+        QCOMPARE(back.lines[4].FldID, short(31));
+        QCOMPARE(back.lines[4].Prefix, QString("יח'"));
+        QVERIFY(back.lines[4].Border);
+        QCOMPARE(back.lines[4].FontSize, uchar(9)); // a value that does not read keeps the field's
+        QCOMPARE(back.bar.DimX, 0.02f);
+        // A negative symbology keeps the bar section out of the store both ways.
+        back.bar.BarType = -1;
+        back.bar.DimX = 0.5f;
+        SetGetLabelDefs(2, back, store);
+        QCOMPARE(back.bar.DimX, 0.5f);
+    }
+
+    // The print button with Direct: pictures and page in the job folder, the page shown.
+    void printButton()
+    {
+        LabelData data;
+        const QString temp = work.filePath("temp");
+        qputenv("Temp", temp.toUtf8());
+        CardFixture f(QStringLiteral("[GeneralParams]\nDBPath=%1\nOptOLE3=True\nOptOLE0=False\n"
+                                     "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelDef1]\nUseCell=-1\nFldID=1\n"
+                                     "[LabelBar]\nBarType=2\n").arg(data.folder).toUtf8());
+        auto viewer = std::make_shared<RecordingViewer>();
+        Services s = f.card->services();
+        s.pages = viewer;
+        MainCard card(nullptr, s);
+        card.show();
+        f.prompt->clear();
+        card.control<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
+        const QString folder = temp + "/tgrlab";
+        QCOMPARE(viewer->shown, QStringList{folder + "/tgrlab1.htm"});
+        // A roll takes the items last to first: B1 (no barcode), A2, A1.
+        QCOMPARE(QDir(folder).entryList({"*.BMP"}), QStringList({"B0400002.BMP", "B0400003.BMP"}));
+        QVERIFY(card.control<QCheckBox>("ChkFldSend(4)")->isChecked());
+        // A page that cannot be laid out opens no window.
+        directLabelLayout().page.PageCols = 0;
+        card.control<QPushButton>("cmdPrintItmes")->click();
+        QCOMPARE(viewer->shown.size(), 1);
+        QCOMPARE(f.prompt->criticalCount(), 1);
+        directLabelLayout() = DirectLabelLayout{};
+        qunsetenv("Temp");
+    }
+};
+
+QTEST_MAIN(TestDirectLabels)
+#include "tst_directlabels.moc"
