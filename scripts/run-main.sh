@@ -4,7 +4,9 @@
 # and at a data folder beside it), then shows the control in a window when a
 # display is available. Without one it runs the control headless: imports the
 # demo company's items with a price list, part numbers, special prices and all
-# price lists, saves a picture of each tab to build/screens/ and says what it did.
+# price lists, marks them all in the item selection, prints them as direct
+# labels (the page's path is printed), saves a picture of each tab to
+# build/screens/ and says what it did.
 set -euo pipefail
 ROOT="$(cd "$(dirname "${BASH_SOURCE[0]}")/.." && pwd)"
 BUILD_DIR="${BUILD_DIR:-$ROOT/build}"
@@ -21,7 +23,9 @@ fi
 
 mkdir -p "$BUILD_DIR/screens"
 args=(set cmbPriceField 1 set ChkImportAlterKeys 1 set ChkImportAltKeySup 1 set ChkImportAlterPrices 1
-      set chkReadPriceList 1 set chkReadItemParam 1 click cmdSaveDef2 click CmdImportItems)
+      set chkReadPriceList 1 set chkReadItemParam 1 click cmdSaveDef2 click CmdImportItems
+      click cmdSelectItems click CmdAllItems grab "$BUILD_DIR/screens/selection.png" click cmdClose
+      set "OptOLE(3)" True click cmdPrintItmes)
 for tab in 0 1 2 3 4 5 6 7 8 9; do
   args+=(set MainTab "$tab" grab "$BUILD_DIR/screens/tab$tab.png")
 done
