@@ -55,12 +55,8 @@ private slots:
                                      "[LabelDef2]\nUseCell=-1\nFldID=6\nPrefix=מחיר:\n"
                                      "[LabelBar]\nBarType=2\nDimX=0.01\nBarHeight=0.3\nUserResoX=0\nUserResoY=0\nShowDesc=-1\n"
                                      "[DirectLabel]\nPageRows=20\nPageCols=3\n").arg(data).toUtf8());
-        auto viewer = std::make_shared<RecordingViewer>();
-        Services s = f.card->services();
-        s.pages = viewer;
-        MainCard card(nullptr, s);
-        card.show();
-        f.prompt->clear();
+        auto& viewer = f.pages;
+        MainCard& card = *f.card;
         card.control<QPushButton>("cmdPrintItmes")->click();
         QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
         QCOMPARE(viewer->shown.size(), 1);

@@ -289,12 +289,8 @@ private slots:
         CardFixture f(QStringLiteral("[GeneralParams]\nDBPath=%1\nOptOLE3=True\nOptOLE0=False\n"
                                      "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelDef1]\nUseCell=-1\nFldID=1\n"
                                      "[LabelBar]\nBarType=2\n").arg(data.folder).toUtf8());
-        auto viewer = std::make_shared<RecordingViewer>();
-        Services s = f.card->services();
-        s.pages = viewer;
-        MainCard card(nullptr, s);
-        card.show();
-        f.prompt->clear();
+        auto& viewer = f.pages;
+        MainCard& card = *f.card;
         card.control<QPushButton>("cmdPrintItmes")->click();
         QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
         const QString folder = temp + "/tgrlab";

@@ -51,6 +51,7 @@ struct CardFixture {
     std::shared_ptr<tagora::ScriptedPrompt> prompt = std::make_shared<tagora::ScriptedPrompt>(nullptr);
     std::shared_ptr<tagora::ScriptedFileDialog> files = std::make_shared<tagora::ScriptedFileDialog>();
     std::shared_ptr<TestDialogRunner> dialogs = std::make_shared<TestDialogRunner>();
+    std::shared_ptr<RecordingViewer> pages = std::make_shared<RecordingViewer>();
     std::unique_ptr<tagora::MainCard> card;
 
     // iniText is written to the settings file first when given; priceFields
@@ -70,6 +71,7 @@ struct CardFixture {
         s.prompt = prompt;
         s.fileDialog = files;
         s.dialogs = dialogs;
+        s.pages = pages;
         s.printers = std::make_shared<tagora::FixedPrinterCatalog>(printers);
         card = std::make_unique<tagora::MainCard>(nullptr, s);
         card->control<QComboBox>(QStringLiteral("cmbPriceField"))->addItems(priceFields);
