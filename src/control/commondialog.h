@@ -29,7 +29,6 @@ public:
 class WidgetFileDialog : public FileDialogProvider {
 public:
     explicit WidgetFileDialog(QWidget* parent = nullptr) : m_parent(parent) {}
-    void setParent(QWidget* parent) { m_parent = parent; }
     std::optional<QString> openFile(const FileRequest& request) override;
 
     // "All Files (*.*)|*.*|X (*.lbl)|*.lbl" as Qt writes it.

@@ -75,7 +75,7 @@ MainCard::MainCard(QWidget* parent, Services services)
 
     ui->setupUi(this);
     setLayoutDirection(Qt::RightToLeft);
-    renameControlArrays();
+    renameIndexedControls(this);
 
     // Captions may show stored values (file names, numbers); never read them as markup.
     for (QLabel* label : findChildren<QLabel*>())
@@ -102,11 +102,6 @@ MainCard::MainCard(QWidget* parent, Services services)
 }
 
 MainCard::~MainCard() = default;
-
-void MainCard::renameControlArrays()
-{
-    renameIndexedControls(this);
-}
 
 void MainCard::buildFieldRows()
 {

@@ -132,7 +132,6 @@ protected:
     bool eventFilter(QObject* watched, QEvent* event) override;
 
 private:
-    void renameControlArrays();
     void buildFieldRows();
     void connectHandlers();
     void applyProgressGeometry();

@@ -15,11 +15,4 @@ public:
     virtual void setProgress(double fraction) = 0;
 };
 
-// For callers that have nowhere to report.
-class NullProgress : public ProgressSink {
-public:
-    void setMessage(const QString&) override {}
-    void setProgress(double) override {}
-};
-
 } // namespace tagora

@@ -38,7 +38,6 @@ public:
 class MessageBoxPrompt : public Prompt {
 public:
     explicit MessageBoxPrompt(QWidget* parent = nullptr) : m_parent(parent) {}
-    void setParent(QWidget* parent) { m_parent = parent; }
     void message(PromptIcon icon, const QString& title, const QString& text) override;
     bool ask(PromptIcon icon, const QString& title, const QString& text) override;
 

@@ -153,9 +153,10 @@ std::vector<Table> schema(bool labelLists)
     table("PARTEXTFILE", {I("PART"), I("EXTFILENUM"), V("EXTFILENAME", 80), V("EXTFILEDES", 48)}, {}, {{"PART"}});
     table("PARTSPECTYPES", {I("NUMBER"), V("SPECDES", 20)}, {"NUMBER"});
     {
+        // The item's ten property values, one column per property type number.
         std::vector<Column> specColumns{I("PART")};
-        for (int n = 1; n <= 10; ++n)
-            specColumns.push_back({QStringLiteral("SPEC%1").arg(n), Kind::Text, 32});
+        for (const char* name : {"SPEC1", "SPEC2", "SPEC3", "SPEC4", "SPEC5", "SPEC6", "SPEC7", "SPEC8", "SPEC9", "SPEC10"})
+            specColumns.push_back({QLatin1String(name), Kind::Text, 32});
         table("PARTSPEC", std::move(specColumns), {"PART"});
     }
     table("PARTTEXT", {I("PART"), I("TEXTORD"), V("TEXT", 68)}, {"PART", "TEXTORD"});

@@ -413,8 +413,14 @@ private slots:
         QVERIFY(picture.at(0, u"EXTFILENAME"_s).toString().startsWith(".."_L1));
         QUERY(types, db, u"SELECT PST.NUMBER, PST.SPECDES FROM PARTSPECTYPES PST WHERE PST.NUMBER > 0 ORDER BY PST.NUMBER"_s);
         QVERIFY(types.texts(u"SPECDES"_s).contains(QString()));
+        // The property columns the card reads: one per property type number.
+        const QStringList propertyColumns = {u"PS.SPEC1"_s, u"PS.SPEC2"_s, u"PS.SPEC3"_s, u"PS.SPEC4"_s, u"PS.SPEC5"_s,
+                                             u"PS.SPEC6"_s, u"PS.SPEC7"_s, u"PS.SPEC8"_s, u"PS.SPEC9"_s, u"PS.SPEC10"_s};
+        QStringList wanted;
+        for (const QString& number : types.texts(u"NUMBER"_s))
+            wanted << propertyColumns.value(number.toInt() - 1);
         for (const QString& sql :
-             {u"SELECT PS.PART, PS.SPEC%2 FROM PARTSPEC PS WHERE PS.PART = %1"_s.arg(id, types.texts(u"NUMBER"_s).join(u", PS.SPEC"_s)),
+             {u"SELECT PS.PART, %2 FROM PARTSPEC PS WHERE PS.PART = %1"_s.arg(id, wanted.join(u", "_s)),
               u"SELECT C.CUSTNAME As AccountKey, C.CUSTDES As FullName, CPP.PRICE, CR.CODE As CurrencyCode FROM CUSTOMERS C,"
               " CUSTPARTPRICE CPP, CURRENCIES CR WHERE CPP.PART = %1 AND CPP.EXPIRYDATE >= %2 AND CPP.FROMDATE <= %2"
               " AND C.CUST = CPP.CUST AND CR.CURRENCY = CPP.CURRENCY ORDER BY C.CUSTNAME"_s.arg(id, today),
