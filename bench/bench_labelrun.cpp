@@ -1,10 +1,10 @@
 // A label run through the journal: 20,000 marked items with every one of the
 // 38 label fields sent. Prints records per second, and the time the run
 // spends outside the journal's own writing (query, formatting, adapters).
-#include "labels/automation.h"
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
 #include "labels/labelrun.h"
+#include "labels/programautomation.h"
 #include "benchdata.h"
 
 #include <QCoreApplication>

@@ -6,15 +6,15 @@
 //   --demo DIR (with --demo-items N, --demo-type 1|2 before it).
 // A dialog that a command opens takes the verbs that follow until one of them
 // closes it; verbs name the dialog's controls first, then the control's.
-#include "control/automation.h"
-#include "control/commondialog.h"
-#include "control/controlbinding.h"
 #include "control/maincard.h"
-#include "control/prompt.h"
-#include "control/settingsstore.h"
 #include "control/settingstable.h"
 #include "erp/demosetup.h"
-#include "labels/browser.h"
+#include "platform/controlbinding.h"
+#include "platform/filedialog.h"
+#include "platform/namedcontrols.h"
+#include "platform/pageviewer.h"
+#include "platform/prompt.h"
+#include "platform/settingsstore.h"
 
 #include <QAbstractItemView>
 #include <QApplication>

@@ -1,6 +1,6 @@
 // The window host: a main window with the control on it.
 #include "control/maincard.h"
-#include "control/settingsstore.h"
+#include "platform/settingsstore.h"
 
 #include <QApplication>
 #include <QCommandLineParser>

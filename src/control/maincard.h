@@ -1,7 +1,7 @@
 #pragma once
 
-#include "control/progress.h"
-#include "control/services.h"
+#include "platform/progress.h"
+#include "platform/services.h"
 
 #include <QPointer>
 #include <QVariant>
@@ -35,7 +35,7 @@ struct SharedDialogState {
 // The label printing control: ten tabs of settings and commands, a status line
 // and a progress bar, and the public methods a host drives it with. The
 // controls are the settings: every command reads its values from them.
-class MainCard : public QWidget, public ProgressSink {
+class MainCard : public QWidget, public ProgressSink, public ControlCommands {
     Q_OBJECT
 public:
     // The creation steps run here, with the services given (or the defaults).
@@ -120,8 +120,9 @@ public:
     // Item range criteria of the labels-by-items tab: " And ItemKey >= '..'" and so on.
     QString itemRangeCriteria() const;
 
-    // Opens the card of an item: from the ERP, or from the local databases.
-    void showItemCard(const QString& itemKey, bool fromErp);
+    // What the dialogs ask of the control.
+    void showItemCard(const QString& itemKey, bool fromErp) override;
+    void printMarkedItems() override { cmdPrintItmes_Click(); }
 
 signals:
     // Every change of the status line text.

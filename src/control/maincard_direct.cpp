@@ -1,14 +1,14 @@
 // The control's side of direct labels: the layout, the job, the printers.
 #include "control/maincard.h"
 
-#include "control/prompt.h"
-#include "control/settingsstore.h"
 #include "labels/barcode.h"
-#include "labels/browser.h"
 #include "labels/directlabels.h"
 #include "labels/directlayout.h"
 #include "labels/labelfields.h"
-#include "labels/printers.h"
+#include "platform/pageviewer.h"
+#include "platform/printercatalog.h"
+#include "platform/prompt.h"
+#include "platform/settingsstore.h"
 
 #include "ui_maincard.h"
 

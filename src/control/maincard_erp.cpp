@@ -2,13 +2,13 @@
 // and the item import with its public readers.
 #include "control/maincard.h"
 
-#include "control/prompt.h"
-#include "control/settingsstore.h"
 #include "dialogs/frmlogon.h"
 #include "erp/connparams.h"
 #include "erp/itemimport.h"
 #include "erp/odbc.h"
 #include "localdb/schema.h"
+#include "platform/prompt.h"
+#include "platform/settingsstore.h"
 
 #include "ui_maincard.h"
 

@@ -2,13 +2,13 @@
 // data query from the screen's settings, and the run.
 #include "control/maincard.h"
 
-#include "control/prompt.h"
-#include "control/settingsstore.h"
 #include "control/settingstable.h"
-#include "labels/automation.h"
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
 #include "labels/labelrun.h"
+#include "labels/programautomation.h"
+#include "platform/prompt.h"
+#include "platform/settingsstore.h"
 
 #include "ui_maincard.h"
 

@@ -1,7 +1,7 @@
 #include "control/settingstable.h"
 
-#include "control/platformdefaults.h"
 #include "labels/labelfields.h"
+#include "platform/platformdefaults.h"
 
 #include <QObject>
 

@@ -1,6 +1,7 @@
 #pragma once
 
-#include "control/controlbinding.h"
+#include "platform/controlbinding.h"
+#include "platform/settingsstore.h"
 
 #include <QString>
 #include <optional>
@@ -22,8 +23,6 @@ struct SettingSection {
     QString name;    // section name in the store
     QString saveButton;
 };
-
-inline const QString kSettingsApp = QStringLiteral("Tagora");
 
 // The seven sections in number order.
 const std::vector<SettingSection>& settingSections();

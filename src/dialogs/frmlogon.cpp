@@ -1,11 +1,10 @@
 #include "dialogs/frmlogon.h"
 
-#include "control/controlbinding.h"
-#include "control/prompt.h"
-#include "control/settingsstore.h"
-#include "control/settingstable.h"
 #include "erp/connparams.h"
 #include "erp/odbc.h"
+#include "platform/controlbinding.h"
+#include "platform/prompt.h"
+#include "platform/settingsstore.h"
 
 #include "ui_frmlogon.h"
 

@@ -1,6 +1,6 @@
 #pragma once
 
-#include "control/services.h"
+#include "platform/services.h"
 
 #include <QDialog>
 #include <memory>

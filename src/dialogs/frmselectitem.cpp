@@ -1,10 +1,9 @@
 #include "dialogs/frmselectitem.h"
 
-#include "control/automation.h"
-#include "control/maincard.h"
-#include "control/platformdefaults.h"
 #include "dialogs/boundgrid.h"
 #include "localdb/schema.h"
+#include "platform/namedcontrols.h"
+#include "platform/platformdefaults.h"
 
 #include "ui_frmselectitem.h"
 
@@ -40,13 +39,13 @@ QIcon cardIcon()
 }
 } // namespace
 
-FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, MainCard* card, QWidget* parent)
+FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands, QWidget* parent)
     : QDialog(parent)
     , ui(std::make_unique<Ui::FrmSelectItemForm>())
     , m_model(new BoundTableModel(this))
     , m_dataFolder(dataFolder)
     , m_criteria(itemCriteria)
-    , m_card(card)
+    , m_commands(commands)
 {
     ui->setupUi(this);
     renameIndexedControls(this);
@@ -218,16 +217,16 @@ void FrmSelectItem::cmdShowAll_Click()
 
 void FrmSelectItem::cmdPrint_Click()
 {
-    if (m_card)
-        m_card->cmdPrintItmes_Click();
+    if (m_commands)
+        m_commands->printMarkedItems();
 }
 
 void FrmSelectItem::VSSelectItems_Click(int row, int column)
 {
-    if (column != 0 || !m_card)
+    if (column != 0 || !m_commands)
         return;
     const QString key = ui->VSSelectItems->text(row, 1);
-    m_card->showItemCard(key, findChild<QRadioButton*>(QStringLiteral("OptItmCard(0)"))->isChecked());
+    m_commands->showItemCard(key, findChild<QRadioButton*>(QStringLiteral("OptItmCard(0)"))->isChecked());
 }
 
 } // namespace tagora

@@ -1,9 +1,8 @@
 #pragma once
 
-#include "control/services.h"
+#include "platform/services.h"
 
 #include <QDialog>
-#include <QPointer>
 #include <memory>
 
 namespace Ui {
@@ -13,15 +12,15 @@ class FrmSelectItemForm;
 namespace tagora {
 
 class BoundTableModel;
-class MainCard;
 
 // The item selection: a page of items in which the user ticks what to print
 // and types copies, writing straight into the items table.
 class FrmSelectItem : public QDialog {
     Q_OBJECT
 public:
-    // dataFolder and itemCriteria come from the control that opens the dialog.
-    FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, MainCard* card, QWidget* parent = nullptr);
+    // dataFolder and itemCriteria come from the control that opens the dialog;
+    // commands (may be null) answers the card column and the print button.
+    FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands, QWidget* parent = nullptr);
     ~FrmSelectItem() override;
 
     QString BuildSelectItemsQuery(const QString& extraConditions, bool onlyMarked, int sortBy, int sortDirection) const;
@@ -44,7 +43,7 @@ private:
     BoundTableModel* m_model;
     QString m_dataFolder;
     QString m_criteria;
-    QPointer<MainCard> m_card;
+    ControlCommands* m_commands;
 };
 
 } // namespace tagora

@@ -1,9 +1,8 @@
 #include "erp/connparams.h"
 
-#include "control/settingsstore.h"
-#include "control/settingstable.h"
 #include "erp/odbc.h"
 #include "erp/textconv.h"
+#include "platform/settingsstore.h"
 
 namespace tagora {
 

@@ -1,9 +1,8 @@
 #include "erp/demosetup.h"
 
-#include "control/settingsstore.h"
-#include "control/settingstable.h"
 #include "erp/connparams.h"
 #include "localdb/database.h"
+#include "platform/settingsstore.h"
 
 #include <QDir>
 #include <QFileInfo>

@@ -1,9 +1,9 @@
 #include "erp/itemimport.h"
 
-#include "control/progress.h"
 #include "erp/odbc.h"
 #include "erp/textconv.h"
 #include "localdb/database.h"
+#include "platform/progress.h"
 
 namespace tagora {
 

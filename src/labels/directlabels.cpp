@@ -1,10 +1,10 @@
 #include "labels/directlabels.h"
 
-#include "control/progress.h"
 #include "erp/textconv.h"
 #include "labels/barcode.h"
 #include "labels/numberformat.h"
 #include "localdb/database.h"
+#include "platform/progress.h"
 
 #include <QDir>
 #include <QFile>

@@ -1,7 +1,6 @@
 #include "labels/directlayout.h"
 
-#include "control/settingsstore.h"
-#include "control/settingstable.h"
+#include "platform/settingsstore.h"
 
 #include <cmath>
 #include <functional>

@@ -260,4 +260,29 @@ bool LabelProgram::start(const AutomationRegistry& registry, RunTrace& trace, QS
     return m_app != nullptr;
 }
 
+QString labelFileFilter(int programCode)
+{
+    switch (programCode) {
+    case 5: return QStringLiteral("All Files (*.*)|*.*|NiceLabel Files (*.lbl)|*.lbl");
+    case 2: return QStringLiteral("All Files (*.*)|*.*|CodeSoft Files (*.lab)|*.lab");
+    case 4: return QStringLiteral("All Files (*.*)|*.*|BarTender Files (*.btw)|*.btw");
+    case 7: return QStringLiteral("All Files (*.*)|*.*|FastLabel Files (*.lbl)|*.lbl");
+    case 1: return QStringLiteral("All Files (*.*)|*.*|Venmar Definitions (*.tds)|*.tds");
+    default: return QString();
+    }
+}
+
+QString ChooseLabelFile(int programCode, CommonDialog* dialog, bool promptCreate)
+{
+    if (!dialog)
+        return QString();
+    dialog->flags = promptCreate ? CommonDialog::CreatePrompt : CommonDialog::HideReadOnly;
+    dialog->filter = labelFileFilter(programCode);
+    dialog->filterIndex = 2;
+    dialog->fileName.clear();
+    if (!dialog->showOpen())
+        return QString();
+    return dialog->fileName;
+}
+
 } // namespace tagora

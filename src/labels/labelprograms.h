@@ -1,6 +1,7 @@
 #pragma once
 
-#include "labels/automation.h"
+#include "labels/programautomation.h"
+#include "platform/filedialog.h"
 
 #include <QString>
 #include <memory>
@@ -55,5 +56,11 @@ protected:
     QString m_progId;
     std::shared_ptr<AutomationObject> m_app;
 };
+
+// The label-file filter for a label program code; empty for an unknown code.
+QString labelFileFilter(int programCode);
+
+// Asks for a label file of the given program; empty text when cancelled.
+QString ChooseLabelFile(int programCode, CommonDialog* dialog, bool promptCreate);
 
 } // namespace tagora

@@ -1,10 +1,10 @@
 #include "labels/labelrun.h"
 
-#include "control/progress.h"
-#include "labels/automation.h"
 #include "labels/labelprograms.h"
 #include "labels/numberformat.h"
+#include "labels/programautomation.h"
 #include "localdb/database.h"
+#include "platform/progress.h"
 
 #include <QDateTime>
 #include <QHash>

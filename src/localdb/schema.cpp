@@ -1,6 +1,6 @@
 #include "localdb/schema.h"
 
-#include "control/platformdefaults.h"
+#include "platform/platformdefaults.h"
 
 #include <QDir>
 #include <QFile>

@@ -1,9 +1,9 @@
 #include "support/cardfixture.h"
 
-#include "control/automation.h"
-#include "control/clicklabel.h"
-#include "control/controlbinding.h"
 #include "localdb/schema.h"
+#include "platform/clicklabel.h"
+#include "platform/controlbinding.h"
+#include "platform/namedcontrols.h"
 
 #include <QCheckBox>
 #include <QDir>

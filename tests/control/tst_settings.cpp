@@ -1,7 +1,7 @@
 #include "support/cardfixture.h"
 
-#include "control/controlbinding.h"
 #include "control/settingstable.h"
+#include "platform/controlbinding.h"
 
 #include <QCheckBox>
 #include <QDir>

@@ -7,11 +7,22 @@
 
 #include <QLineEdit>
 #include <QPushButton>
+#include <QRadioButton>
 #include <QComboBox>
 #include <QTemporaryDir>
 #include <QtTest>
 
 using namespace tagora;
+
+// Stands where the control would: notes what the dialog asks of it.
+struct RecordingCommands : ControlCommands {
+    QStringList asked;
+    void showItemCard(const QString& itemKey, bool fromErp) override
+    {
+        asked << QStringLiteral("card %1 %2").arg(itemKey, fromErp ? "erp" : "local");
+    }
+    void printMarkedItems() override { asked << QStringLiteral("print"); }
+};
 
 class TestFrmSelectItem : public QObject {
     Q_OBJECT
@@ -137,6 +148,21 @@ private slots:
         c<QLineEdit>(f, "txtToItemName")->setText(text);
         c<QPushButton>(f, QStringLiteral("cmdFindByDesc(%1)").arg(button))->click();
         QCOMPARE(f.model()->value(grid(f)->currentRowIndex(), "ItemKey").toString(), found);
+    }
+
+    // The card column opens the row's item from the source chosen, and the
+    // print button runs the control's print, through what the dialog was given.
+    void cardColumnAndPrintReachTheControl()
+    {
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('A''1', 'x', 1, 0), ('B2', 'y', 1, 0)");
+        RecordingCommands commands;
+        FrmSelectItem f(folder, QString(), &commands);
+        emit grid(f)->cellActivated(1, 0);
+        c<QRadioButton>(f, "OptItmCard(1)")->setChecked(true);
+        emit grid(f)->cellActivated(0, 0);
+        emit grid(f)->cellActivated(0, 2); // not the card column
+        c<QPushButton>(f, "cmdPrint")->click();
+        QCOMPARE(commands.asked, QStringList({"card B2 erp", "card A'1 local", "print"}));
     }
 };
 

@@ -6,9 +6,9 @@
 
 #include "erp/connparams.h"
 #include "erp/itemimport.h"
-#include "labels/browser.h"
 #include "labels/directlayout.h"
 #include "localdb/schema.h"
+#include "platform/pageviewer.h"
 
 #include <QProcess>
 #include <QPushButton>

@@ -4,10 +4,10 @@
 
 #include "erp/textconv.h"
 #include "labels/barcode.h"
-#include "labels/browser.h"
 #include "labels/directlabels.h"
 #include "labels/directlayout.h"
 #include "labels/itemquery.h"
+#include "platform/pageviewer.h"
 
 #include <QCheckBox>
 #include <QLineEdit>

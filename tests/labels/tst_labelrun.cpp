@@ -2,10 +2,10 @@
 #include "support/cardfixture.h"
 #include "support/labeldata.h"
 
-#include "labels/automation.h"
 #include "labels/itemquery.h"
 #include "labels/labelprograms.h"
 #include "labels/labelrun.h"
+#include "labels/programautomation.h"
 
 #include <QCheckBox>
 #include <QLineEdit>

@@ -2,12 +2,12 @@
 
 // A control wired to a private settings file, a scripted prompt and file
 // dialog, and a fixed printer list, as every control test needs.
-#include "control/commondialog.h"
 #include "control/maincard.h"
-#include "control/printercatalog.h"
-#include "control/prompt.h"
-#include "control/settingsstore.h"
-#include "labels/browser.h"
+#include "platform/filedialog.h"
+#include "platform/pageviewer.h"
+#include "platform/printercatalog.h"
+#include "platform/prompt.h"
+#include "platform/settingsstore.h"
 
 #include <QComboBox>
 #include <QDialog>

@@ -8,6 +8,9 @@ class QSettings;
 
 namespace tagora {
 
+// The application every setting of the system is stored under.
+inline const QString kSettingsApp = QStringLiteral("Tagora");
+
 // The per-user key-value store behind every setting: application, section,
 // key, text value. Nothing here knows about controls.
 class SettingsStore {

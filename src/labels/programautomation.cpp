@@ -1,4 +1,4 @@
-#include "labels/automation.h"
+#include "labels/programautomation.h"
 
 #include <QDir>
 

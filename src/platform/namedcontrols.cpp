@@ -1,4 +1,4 @@
-#include "control/automation.h"
+#include "platform/namedcontrols.h"
 
 #include <QAbstractButton>
 #include <QJsonDocument>

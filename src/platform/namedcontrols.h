@@ -10,6 +10,10 @@ class QWidget;
 
 namespace tagora {
 
+// Reaching a control, its click and its public methods by name, as a host's
+// script or the headless host's verbs do. (The label programs' automation
+// objects are another matter: labels/programautomation.h.)
+
 // Designer names must be identifiers, so a control array element X(i) is
 // drawn as X_i; this gives every such widget under root its published name.
 void renameIndexedControls(QWidget* root);

@@ -1,4 +1,4 @@
-#include "control/settingsstore.h"
+#include "platform/settingsstore.h"
 
 #include <QDir>
 #include <QFileInfo>

@@ -1,4 +1,4 @@
-#include "control/platformdefaults.h"
+#include "platform/platformdefaults.h"
 
 #include <QDir>
 #include <QStandardPaths>

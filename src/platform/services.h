@@ -1,5 +1,6 @@
 #pragma once
 
+#include <QString>
 #include <memory>
 
 class QDialog;
@@ -11,6 +12,8 @@ class Prompt;
 class FileDialogProvider;
 class PrinterCatalog;
 class DialogRunner;
+// Defined by the labels layer; held here only by pointer, so the services can
+// carry a host's label program providers without this layer knowing them.
 class AutomationRegistry;
 class PageViewer;
 
@@ -20,6 +23,18 @@ class DialogRunner {
 public:
     virtual ~DialogRunner() = default;
     virtual int run(QDialog& dialog);
+};
+
+// What a dialog may ask of the control that opened it: an item's card, or
+// one of the control's own print commands. Dialogs are given this rather
+// than the control, so they sit below it and can be opened by any host.
+class ControlCommands {
+public:
+    virtual ~ControlCommands() = default;
+    // Opens the card of an item: from the ERP, or from the local databases.
+    virtual void showItemCard(const QString& itemKey, bool fromErp) = 0;
+    // Prints the marked items, as the control's print-by-items button does.
+    virtual void printMarkedItems() = 0;
 };
 
 // What the control needs from its host's platform. A host leaves a member

@@ -1,4 +1,4 @@
-#include "control/controlbinding.h"
+#include "platform/controlbinding.h"
 
 #include <QCheckBox>
 #include <QComboBox>

@@ -1,4 +1,4 @@
-#include "control/clicklabel.h"
+#include "platform/clicklabel.h"
 
 #include <QMouseEvent>
 

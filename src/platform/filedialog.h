@@ -77,10 +77,4 @@ private:
     FileDialogProvider* m_provider = nullptr;
 };
 
-// The label-file filter for a label program code; empty for an unknown code.
-QString labelFileFilter(int programCode);
-
-// Asks for a label file of the given program; empty text when cancelled.
-QString ChooseLabelFile(int programCode, CommonDialog* dialog, bool promptCreate);
-
 } // namespace tagora

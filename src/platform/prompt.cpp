@@ -1,4 +1,4 @@
-#include "control/prompt.h"
+#include "platform/prompt.h"
 
 #include <QMessageBox>
 

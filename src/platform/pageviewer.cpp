@@ -1,7 +1,6 @@
-#include "labels/browser.h"
+#include "platform/pageviewer.h"
 
-#include "control/settingsstore.h"
-#include "control/settingstable.h"
+#include "platform/settingsstore.h"
 
 #include <QDesktopServices>
 #include <QFileInfo>

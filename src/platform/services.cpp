@@ -1,4 +1,4 @@
-#include "control/services.h"
+#include "platform/services.h"
 
 #include <QDialog>
 

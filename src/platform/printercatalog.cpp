@@ -1,7 +1,6 @@
-#include "labels/printers.h"
+#include "platform/printercatalog.h"
 
-#include "control/settingsstore.h"
-#include "control/settingstable.h"
+#include "platform/settingsstore.h"
 
 #include <cups/cups.h>
 
@@ -16,6 +15,11 @@ QString destName(const cups_dest_t& d)
     return name;
 }
 } // namespace
+
+std::shared_ptr<PrinterCatalog> systemPrinterCatalog()
+{
+    return std::make_shared<CupsPrinterCatalog>();
+}
 
 QStringList CupsPrinterCatalog::printerNames() const
 {
