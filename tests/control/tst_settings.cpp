@@ -232,15 +232,57 @@ private slots:
         QCOMPARE(second.card->GetOLEOption(), short(6));
     }
 
-    void handWrittenFile()
+    // What an administrator might type, read as typed: Qt would take an
+    // unquoted comma for a list and lose the blanks around it.
+    void handWrittenValues_data()
     {
-        // What an administrator might type: an unquoted comma, Hebrew, no quoting at all.
-        CardFixture f(QByteArray("[GeneralParams]\nCompanyName=Acme, Ltd\n[LabelVars]\n05FldSend=1\n05VarNum=3\n")
-                      + QString::fromUtf8("[LabelByItems]\nAccountKey=לקוח 7\n").toUtf8());
-        QCOMPARE(get(f, "txtCompanyName"), QString("Acme, Ltd"));
-        QCOMPARE(get(f, "ChkFldSend(5)"), QString("1"));
-        QCOMPARE(get(f, "lblVarNum(5)"), QString("3"));
-        QCOMPARE(get(f, "txtAccountKey"), QString::fromUtf8("לקוח 7"));
+        QTest::addColumn<QString>("line");
+        QTest::addColumn<QString>("value");
+        QTest::newRow("price format") << "PriceFormat=#,##0.00" << "#,##0.00";
+        QTest::newRow("company") << "PriceFormat=Acme, Ltd" << "Acme, Ltd";
+        QTest::newRow("blanks around commas") << "PriceFormat=a ,b ,  c  " << "a ,b ,  c";
+        QTest::newRow("Hebrew") << QString::fromUtf8("PriceFormat=לקוח 7, סניף ב") << QString::fromUtf8("לקוח 7, סניף ב");
+        QTest::newRow("comment after it") << "PriceFormat=0,00 ; two places" << "0,00";
+        QTest::newRow("quoted part") << "PriceFormat=\"x, y\", z" << "x, y, z";
+        QTest::newRow("escapes") << "PriceFormat=c:\\\\labels,\\x5d" << "c:\\labels,]";
+        QTest::newRow("no comma") << "PriceFormat= 0.0 " << "0.0";
+    }
+    void handWrittenValues()
+    {
+        QFETCH(QString, line);
+        QFETCH(QString, value);
+        CardFixture f(("[GeneralParams]\nPrintDelay=3\n\n[LabelVars]\n05VarNum=3\n" + line + "\n07VarNum=4\n").toUtf8());
+        QCOMPARE(get(f, "txtPriceFormat"), value);
+        QCOMPARE(get(f, "lblVarNum(7)"), QString("4"));
+    }
+
+    // What this store writes, it reads back unchanged.
+    void storeRoundTrip_data()
+    {
+        QTest::addColumn<QString>("value");
+        QTest::newRow("commas") << "#,##0.00";
+        QTest::newRow("comma and blank") << "Acme, Ltd";
+        QTest::newRow("quotes") << "say \"hi\", \"bye\"";
+        QTest::newRow("leading and trailing blanks") << "  3 ";
+        QTest::newRow("backslashes") << "\\\\server\\share, c:\\x";
+        QTest::newRow("Hebrew") << QString::fromUtf8("חברת \"אלף\", בע'מ");
+        QTest::newRow("comment and equals signs") << "a;b=c";
+        QTest::newRow("at sign") << "@start, @end";
+        QTest::newRow("empty") << "";
+    }
+    void storeRoundTrip()
+    {
+        QFETCH(QString, value);
+        QTemporaryDir dir;
+        const QString path = dir.filePath("t.ini");
+        {
+            IniSettingsStore store(path);
+            QVERIFY(store.setValue("Tagora", "LabelVars", "PriceFormat", value));
+            QVERIFY(store.setValue("OtherApp", "S", "K", value));
+        }
+        IniSettingsStore store(path);
+        QCOMPARE(store.value("Tagora", "LabelVars", "PriceFormat").value_or("<missing>"), value);
+        QCOMPARE(store.value("OtherApp", "S", "K").value_or("<missing>"), value);
     }
 
     void corruptFileGivesDefaultsAndIsNotOverwritten()
