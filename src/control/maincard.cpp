@@ -30,6 +30,9 @@
 #include <QRadioButton>
 #include <QShowEvent>
 
+#include <iterator>
+#include <vector>
+
 namespace tagora {
 
 namespace {
@@ -257,10 +260,8 @@ void MainCard::UserControl_InitProperties()
 
 void MainCard::UserControl_Show()
 {
-    if (TestConnection()) {
-        FillCmbPriceField();
-        FillCmbUser();
-    }
+    if (TestConnection())
+        FillErpLists();
     for (int section : showLoadOrder())
         SetGetRegParams(uchar(section), 2);
     if (control<QRadioButton>(QStringLiteral("OptOLE(3)"))->isChecked())
@@ -289,11 +290,47 @@ bool MainCard::eventFilter(QObject* watched, QEvent* event)
 void MainCard::FillPrinterList()
 {
     QComboBox* list = ui->cmbPrinter;
+    // Filled again after a new connection: the printer chosen stays chosen
+    // while it is installed, so a save does not drop it.
+    const QString chosen = list->currentIndex() >= 0 ? list->currentText() : QString();
     list->clear();
     for (const QString& name : m_services.printers->printerNames())
         if (name != QLatin1String("Rendering Subsystem"))
             list->addItem(name);
-    list->setCurrentIndex(-1);
+    list->setCurrentIndex(chosen.isEmpty() ? -1 : list->findText(chosen));
+}
+
+namespace {
+// The lists whose entries come from the ERP.
+const char* const kErpLists[] = {"cmbPriceField", "cmbUser"};
+} // namespace
+
+void MainCard::FillErpLists()
+{
+    FillCmbPriceField();
+    FillCmbUser();
+}
+
+void MainCard::RefillErpLists()
+{
+    // What the user chose stays chosen; a list that was empty (no ERP at show
+    // time) takes its stored position now, as the show step would have.
+    std::vector<int> chosen;
+    for (const char* name : kErpLists)
+        chosen.push_back(control<QComboBox>(QLatin1String(name))->currentIndex());
+    FillErpLists();
+    for (size_t i = 0; i < std::size(kErpLists); ++i) {
+        auto* list = control<QComboBox>(QLatin1String(kErpLists[i]));
+        if (chosen[i] >= 0 && chosen[i] < list->count()) {
+            list->setCurrentIndex(chosen[i]);
+            continue;
+        }
+        for (const SettingSection& section : settingSections())
+            for (const SettingRow& row : settingRows(section.number))
+                if (row.control == QLatin1String(kErpLists[i]))
+                    SetGetRegPrm(2, kSettingsApp, section.name, row.key, list, uchar(row.kind),
+                                 QVariant(row.defaultText));
+    }
 }
 
 // ---------------------------------------------------------- status and progress
@@ -346,19 +383,35 @@ void MainCard::SetGetRegPrm(uchar Action, const QString& pRegApp, const QString&
         return;
     const auto kind = BindKind(pObjType);
     if (Action == 1) {
-        if (const auto text = readBound(pObjRef, kind))
-            m_services.settings->setValue(pRegApp, pRegSection, pParName, *text);
+        const auto text = readBound(pObjRef, kind);
+        if (!text)
+            return;
+        // A list filled from outside (the printers here, the ERP's lists) may
+        // lack what was stored: "nothing chosen" must not replace it.
+        const auto stored = m_services.settings->value(pRegApp, pRegSection, pParName);
+        if (stored && listLacksStored(pObjRef, kind, *stored))
+            return;
+        m_services.settings->setValue(pRegApp, pRegSection, pParName, *text);
     } else if (Action == 2) {
         const auto stored = m_services.settings->value(pRegApp, pRegSection, pParName);
         writeBound(pObjRef, kind, stored ? *stored : variantText(pDefault));
     }
 }
 
-void MainCard::SetGetRegParams(uchar MySection, uchar Action)
+bool MainCard::saveBlocked()
 {
     // No ERP at show time means the lists behind some settings are empty;
     // saving then would overwrite good stored positions with "nothing chosen".
-    if (Action == 1 && ui->cmbPriceField->count() == 0)
+    // Say so, or the user takes the save for done.
+    if (ui->cmbPriceField->count() > 0)
+        return false;
+    setMessage(QStringLiteral("ההגדרות לא נשמרו: רשימת המחירונים ריקה (אין חיבור לפריוריטי)"));
+    return true;
+}
+
+void MainCard::SetGetRegParams(uchar MySection, uchar Action)
+{
+    if (Action == 1 && saveBlocked())
         return;
     const SettingSection* section = settingSection(MySection);
     if (!section)
@@ -370,20 +423,15 @@ void MainCard::SetGetRegParams(uchar MySection, uchar Action)
         m_services.settings->flush();
 }
 
-bool MainCard::SaveSection(int section)
+void MainCard::cmdSaveDef_Click(int section)
 {
-    if (ui->cmbPriceField->count() == 0)
-        return true;
+    if (saveBlocked())
+        return;
     SetGetRegParams(uchar(section), 1);
     if (section == 1 && control<QRadioButton>(QStringLiteral("OptOLE(3)"))->isChecked())
         SetGetLabelDefs(1);
-    return m_services.settings->flush();
-}
-
-void MainCard::cmdSaveDef_Click(int section)
-{
-    if (!SaveSection(section))
-        setMessage(QStringLiteral("שמירת ההגדרות נכשלה: לא ניתן לכתוב לקובץ ההגדרות"));
+    setMessage(m_services.settings->flush() ? QStringLiteral("ההגדרות נשמרו")
+                                            : QStringLiteral("שמירת ההגדרות נכשלה: לא ניתן לכתוב לקובץ ההגדרות"));
 }
 
 // ---------------------------------------------------------------- tab and helpers

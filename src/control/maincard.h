@@ -142,7 +142,12 @@ private:
     void FillPrinterList();
     bool TestConnection();
     void SetGetLabelDefs(int action);
-    bool SaveSection(int section);
+    // The one place that fills the lists whose entries come from the ERP.
+    void FillErpLists();
+    // Fills them again after a new connection, keeping or loading their positions.
+    void RefillErpLists();
+    // True (and said in the status line) when saving must not run.
+    bool saveBlocked();
 
     // Handlers of the screen.
     void MainTab_Click(int tab);

@@ -192,8 +192,10 @@ void MainCard::CmdConnect_Click()
 {
     m_shared.dataFolder = ui->txtDBPath->text();
     FrmLogon dialog(m_services, this);
-    runDialog(dialog);
+    const bool connected = runDialog(dialog) == QDialog::Accepted;
     UserControl_InitProperties();
+    if (connected)
+        RefillErpLists();
 }
 
 void MainCard::ImportItems()

@@ -45,6 +45,20 @@ std::optional<long long> parseWhole(const QString& text)
 }
 } // namespace
 
+bool listLacksStored(const QObject* c, BindKind kind, const QString& stored)
+{
+    auto* list = qobject_cast<const QComboBox*>(c);
+    if (!list || list->isEditable() || list->currentIndex() >= 0)
+        return false;
+    if (kind == BindKind::Text)
+        return !stored.isEmpty() && list->findText(stored, Qt::MatchFixedString) < 0;
+    if (kind == BindKind::ListIndex) {
+        const auto n = parseWhole(stored);
+        return !n || *n < -1 || *n >= list->count();
+    }
+    return false;
+}
+
 std::optional<BindKind> naturalKind(const QObject* c)
 {
     if (qobject_cast<const QLineEdit*>(c) || qobject_cast<const QTextEdit*>(c) || qobject_cast<const QPlainTextEdit*>(c))

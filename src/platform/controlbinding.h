@@ -24,6 +24,12 @@ std::optional<QString> readBound(const QObject* control, BindKind kind);
 // fixed list does not hold).
 bool writeBound(QObject* control, BindKind kind, const QString& text);
 
+// True when the control is a fixed list with nothing chosen and the stored
+// text names what the list does not hold now: a printer not installed here, a
+// position beyond a list filled from outside that is empty or shorter today.
+// Saving "nothing chosen" over such a text would lose it.
+bool listLacksStored(const QObject* control, BindKind kind, const QString& stored);
+
 // The kind a control is naturally addressed by when no settings row says
 // otherwise (text boxes by text, lists and tabs by position, check and option
 // buttons by value, labels by caption).

@@ -11,6 +11,7 @@
 #include "localdb/schema.h"
 
 #include <QCheckBox>
+#include <QComboBox>
 #include <QLineEdit>
 #include <QPushButton>
 #include <QtTest>
@@ -240,6 +241,40 @@ private slots:
         QCOMPARE(e.title, QString("Error reading item: "));
         QVERIFY(!e.message.isEmpty());
         QVERIFY(ReadPriceFields(connection, &e.message).isEmpty());
+    }
+
+    // The first connection of a session fills the ERP's lists at once, with
+    // their stored positions, so the save buttons work again; a cancelled
+    // dialog leaves them empty and a save says it did nothing.
+    void connectingFillsErpLists_data()
+    {
+        QTest::addColumn<QString>("button");
+        QTest::newRow("OK") << "cmdOK";
+        QTest::newRow("cancelled") << "cmdCancel";
+    }
+    void connectingFillsErpLists()
+    {
+        QFETCH(QString, button);
+        const bool ok = button == "cmdOK";
+        CardFixture f("[ImportItems]\nPriceField=2\n[GeneralParams]\nDefPrinter=Zebra\n", {"Office", "Zebra"});
+        auto* prices = f.c<QComboBox>("cmbPriceField");
+        QCOMPARE(prices->count(), 0);
+        f.dialogs->drive = [&](QDialog& logon) {
+            logon.findChild<QLineEdit*>("txtConnServer")->setText(kDsn2);
+            logon.findChild<QComboBox*>("CmbConnType")->setCurrentIndex(1);
+            logon.findChild<QPushButton*>(button)->click();
+        };
+        f.c<QPushButton>("CmdConnect")->click();
+        QCOMPARE(prices->count() > 2, ok);
+        QCOMPARE(prices->currentIndex(), ok ? 2 : -1);
+        QCOMPARE(f.c<QComboBox>("cmbPrinter")->currentText(), QString("Zebra"));
+        f.c<QLineEdit>("txtCopies")->setText("4");
+        f.c<QPushButton>("cmdSaveDef2")->click();
+        QCOMPARE(f.card->message(), ok ? QString::fromUtf8("ההגדרות נשמרו")
+                                       : QString::fromUtf8("ההגדרות לא נשמרו: רשימת המחירונים ריקה (אין חיבור לפריוריטי)"));
+        f.store->flush();
+        QCOMPARE(f.store->value("Tagora", "ImportItems", "Copies").value_or("-"), QString(ok ? "4" : "-"));
+        QCOMPARE(f.store->value("Tagora", "ImportItems", "PriceField").value_or("-"), QString("2"));
     }
 
     // The whole command, as a user runs it from the tab.
