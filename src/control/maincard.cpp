@@ -592,7 +592,7 @@ void MainCard::cmdSelectItems_Click()
     m_shared.itemRangeCriteria = itemRangeCriteria();
     m_shared.itemTextRtl = ui->chkItmRTL->isChecked();
     m_shared.objectRef = this;
-    FrmSelectItem dialog(m_shared.dataFolder, m_shared.itemRangeCriteria, this, this);
+    FrmSelectItem dialog(m_shared.dataFolder, m_shared.itemRangeCriteria, this, m_services.prompt, this);
     runDialog(dialog);
 }
 

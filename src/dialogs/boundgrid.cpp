@@ -5,7 +5,7 @@
 #include <QComboBox>
 #include <QHeaderView>
 
-#include <cmath>
+#include <algorithm>
 
 namespace tagora {
 
@@ -166,10 +166,19 @@ bool BoundTableModel::setData(const QModelIndex& index, const QVariant& value, i
             return false;
         stored = value;
         if (c.kind == BoundColumn::Kind::Number) {
+            const QString typed = value.toString().trimmed();
             bool ok = false;
-            const double d = value.toString().trimmed().toDouble(&ok);
-            // A number that does not read as one is stored as 0, not refused.
-            stored = ok ? QVariant(qlonglong(std::llround(d))) : QVariant(qlonglong(0));
+            const qlonglong n = typed.toLongLong(&ok);
+            if (!ok || n < c.minimum || n > c.maximum) {
+                m_error = QStringLiteral("בעמודה \"%1\" יש להקליד מספר שלם בין %2 ל-%3; הערך \"%4\" לא נשמר")
+                              .arg(c.header)
+                              .arg(c.minimum)
+                              .arg(c.maximum)
+                              .arg(typed);
+                emit writeFailed(m_error);
+                return false;
+            }
+            stored = n;
         }
     }
     return setField({index.row()}, c.field, stored);

@@ -7,6 +7,8 @@
 #include <QVariant>
 #include <QVector>
 
+#include <limits>
+
 namespace tagora {
 
 // One column of a bound grid: which field of the query it shows and how.
@@ -17,6 +19,9 @@ struct BoundColumn {
     Kind kind = Kind::Text;
     bool editable = false;
     Qt::Alignment alignment = Qt::AlignRight | Qt::AlignVCenter;
+    // Number: the whole numbers a cell takes; anything else typed is refused.
+    qlonglong minimum = std::numeric_limits<int>::min();
+    qlonglong maximum = std::numeric_limits<int>::max();
     QVector<QPair<QVariant, QString>> choices; // Choice: stored value and the text shown for it
     QIcon icon;                                // Picture and Button
     QString buttonText;                        // Button
@@ -36,8 +41,8 @@ inline BoundColumn boundColumn(const QString& field, const QString& header, Boun
 
 // The rows of a query over a local database file, with every edit written to
 // its base table at once (found by the key fields, which the query selects).
-// Nothing here shows anything: a failed write leaves the row as it was and is
-// reported through writeFailed.
+// Nothing here shows anything: a failed write, or a typed value the column
+// refuses, leaves the row as it was and is reported through writeFailed.
 class BoundTableModel : public QAbstractTableModel {
     Q_OBJECT
 public:
@@ -66,6 +71,7 @@ public:
     QVariant headerData(int section, Qt::Orientation orientation, int role = Qt::DisplayRole) const override;
 
 signals:
+    // Why a change did not reach the file, in words for the user.
     void writeFailed(const QString& message);
 
 private:

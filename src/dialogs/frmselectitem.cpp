@@ -4,6 +4,7 @@
 #include "localdb/schema.h"
 #include "platform/namedcontrols.h"
 #include "platform/platformdefaults.h"
+#include "platform/prompt.h"
 
 #include "ui_frmselectitem.h"
 
@@ -39,13 +40,15 @@ QIcon cardIcon()
 }
 } // namespace
 
-FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands, QWidget* parent)
+FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands,
+                             std::shared_ptr<Prompt> prompt, QWidget* parent)
     : QDialog(parent)
     , ui(std::make_unique<Ui::FrmSelectItemForm>())
     , m_model(new BoundTableModel(this))
     , m_dataFolder(dataFolder)
     , m_criteria(itemCriteria)
     , m_commands(commands)
+    , m_prompt(prompt ? std::move(prompt) : std::make_shared<MessageBoxPrompt>(this))
 {
     ui->setupUi(this);
     renameIndexedControls(this);
@@ -55,12 +58,19 @@ FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCrite
     using K = BoundColumn::Kind;
     BoundColumn picture = boundColumn(QString(), QString(), K::Picture, false, Qt::AlignCenter);
     picture.icon = cardIcon();
+    // Copies are a 16-bit count; a negative one means nothing to a printer.
+    BoundColumn copies = boundColumn(QStringLiteral("Copies"), QStringLiteral("עותקים"), K::Number, true);
+    copies.minimum = 0;
+    copies.maximum = 32767;
     m_model->setSource(joinDataPath(dataFolder, dbfiles::Items), QStringLiteral("tItems"), {QStringLiteral("ItemKey")},
                        {picture, boundColumn(QStringLiteral("ItemKey"), QStringLiteral("מפתח פריט"), K::Text),
                         boundColumn(QStringLiteral("PrintLabel"), QStringLiteral("להדפיס?"), K::Check, true, Qt::AlignCenter),
-                        boundColumn(QStringLiteral("Copies"), QStringLiteral("עותקים"), K::Number, true),
-                        boundColumn(QStringLiteral("ItemName"), QStringLiteral("שם פריט"), K::Text)});
+                        copies, boundColumn(QStringLiteral("ItemName"), QStringLiteral("שם פריט"), K::Text)});
     ui->VSSelectItems->setBoundModel(m_model);
+    // A value typed into a cell and refused (or not written) is said at once;
+    // the cell keeps what the file holds.
+    connect(m_model, &BoundTableModel::writeFailed, this,
+            [this](const QString& message) { m_prompt->critical(titles::Error, message); });
 
     connect(ui->cmdFindKey, &QPushButton::clicked, this, &FrmSelectItem::cmdFindKey_Click);
     connect(ui->txtToItemkey, &QLineEdit::returnPressed, this, &FrmSelectItem::cmdFindKey_Click);

@@ -12,6 +12,7 @@ class FrmSelectItemForm;
 namespace tagora {
 
 class BoundTableModel;
+class Prompt;
 
 // The item selection: a page of items in which the user ticks what to print
 // and types copies, writing straight into the items table.
@@ -19,8 +20,11 @@ class FrmSelectItem : public QDialog {
     Q_OBJECT
 public:
     // dataFolder and itemCriteria come from the control that opens the dialog;
-    // commands (may be null) answers the card column and the print button.
-    FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands, QWidget* parent = nullptr);
+    // commands (may be null) answers the card column and the print button;
+    // prompt tells the user why a typed value was not stored (message boxes
+    // on this dialog when none is given).
+    FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands,
+                  std::shared_ptr<Prompt> prompt = {}, QWidget* parent = nullptr);
     ~FrmSelectItem() override;
 
     QString BuildSelectItemsQuery(const QString& extraConditions, bool onlyMarked, int sortBy, int sortDirection) const;
@@ -44,6 +48,7 @@ private:
     QString m_dataFolder;
     QString m_criteria;
     ControlCommands* m_commands;
+    std::shared_ptr<Prompt> m_prompt;
 };
 
 } // namespace tagora

@@ -1,5 +1,8 @@
 // The headless host as scripts and acceptance checks use it: a real process
 // with a private settings file.
+#include "localdb/database.h"
+#include "localdb/schema.h"
+
 #include <QDir>
 #include <QFile>
 #include <QProcess>
@@ -145,6 +148,38 @@ private slots:
         const Run r = runCli(settings(), args);
         QCOMPARE(r.exitCode, 2);
         QVERIFY(!r.err.filter("tagora-cli: ").isEmpty());
+    }
+
+    // A copies value the item selection refuses is a mistake in the command
+    // line: said on standard error, exit status 2, the item keeps its copies.
+    void refusedCellValue_data()
+    {
+        QTest::addColumn<QString>("typed");
+        QTest::addColumn<int>("exitCode");
+        QTest::addColumn<QString>("stored");
+        QTest::newRow("a count") << "7" << 0 << "7";
+        QTest::newRow("letters") << "abc" << 2 << "1";
+        QTest::newRow("beyond 32767") << "70000" << 2 << "1";
+        QTest::newRow("negative") << "-3" << 2 << "1";
+    }
+    void refusedCellValue()
+    {
+        QFETCH(QString, typed);
+        QFETCH(int, exitCode);
+        QFETCH(QString, stored);
+        const QString data = dir.filePath("cells");
+        QVERIFY(!tagora::PrepareDataFolder(data));
+        {
+            tagora::Database d;
+            QVERIFY(!d.open(data + "/" + tagora::dbfiles::Items));
+            QVERIFY(!d.exec("DELETE FROM tItems; INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('A1', 'x', 1, 1)"));
+        }
+        const QStringList open{"set", "txtDBPath", data, "click", "cmdSelectItems"};
+        const Run r = runCli(settings(), open + QStringList{"setcell", "VSSelectItems", "1", "3", typed});
+        QCOMPARE(r.exitCode, exitCode);
+        QCOMPARE(r.err.filter("tagora-cli: ").size(), exitCode == 0 ? 0 : 1);
+        const Run after = runCli(settings(), open + QStringList{"getcell", "VSSelectItems", "1", "3"});
+        QCOMPARE(after.out.last(), stored);
     }
 
     void scriptFromStandardInput()

@@ -21,9 +21,12 @@ class TestBoundGrid : public QObject {
         using K = BoundColumn::Kind;
         BoundColumn kind = boundColumn("Kind", "kind", K::Choice, true);
         kind.choices = {{1, "one"}, {2, "two"}};
+        BoundColumn copies = boundColumn("Copies", "copies", K::Number, true);
+        copies.minimum = 0;
+        copies.maximum = 32767;
         m.setSource(db, "t", {"A", "B"},
                     {boundColumn({}, {}, K::Picture), boundColumn("A", "a", K::Text), boundColumn("Mark", "mark", K::Check, true),
-                     boundColumn("Copies", "copies", K::Number, true), kind, boundColumn("Name", "name", K::Text, true)});
+                     copies, kind, boundColumn("Name", "name", K::Text, true)});
     }
 
 private slots:
@@ -63,8 +66,9 @@ private slots:
         QTest::addColumn<QString>("stored");
         QTest::newRow("tick") << 0 << 2 << QVariant(int(Qt::Checked)) << int(Qt::CheckStateRole) << "x|1|1|1|1|first";
         QTest::newRow("untick") << 1 << 2 << QVariant(int(Qt::Unchecked)) << int(Qt::CheckStateRole) << "x|2|0|3|2|second";
-        QTest::newRow("copies") << 1 << 3 << QVariant("7") << int(Qt::EditRole) << "x|2|1|7|2|second";
-        QTest::newRow("copies not a number") << 1 << 3 << QVariant("abc") << int(Qt::EditRole) << "x|2|1|0|2|second";
+        QTest::newRow("copies") << 1 << 3 << QVariant(" 7 ") << int(Qt::EditRole) << "x|2|1|7|2|second";
+        QTest::newRow("copies at the top") << 1 << 3 << QVariant("32767") << int(Qt::EditRole) << "x|2|1|32767|2|second";
+        QTest::newRow("no copies") << 1 << 3 << QVariant("0") << int(Qt::EditRole) << "x|2|1|0|2|second";
         QTest::newRow("choice stores the value") << 0 << 4 << QVariant(2) << int(Qt::EditRole) << "x|1|0|1|2|first";
         QTest::newRow("text with apostrophe") << 2 << 5 << QVariant("it's") << int(Qt::EditRole) << "y's|1|0|0|<null>|it's";
     }
@@ -85,6 +89,33 @@ private slots:
         QCOMPARE(rows(db, QStringLiteral("SELECT * FROM t WHERE A = '%1' AND B = %2").arg(key).arg(m.value(row, "B").toInt())),
                  QStringList{stored});
         QCOMPARE(rows(db, "SELECT count(*) FROM t"), QStringList{"3"});
+    }
+
+    // A number the column cannot take is refused with the reason; the cell
+    // and the file keep what they had.
+    void refusedNumbers_data()
+    {
+        QTest::addColumn<QString>("typed");
+        QTest::newRow("not a number") << "abc";
+        QTest::newRow("too many") << "70000";
+        QTest::newRow("negative") << "-3";
+        QTest::newRow("a fraction") << "2.5";
+        QTest::newRow("empty") << "";
+    }
+    void refusedNumbers()
+    {
+        QFETCH(QString, typed);
+        BoundTableModel m;
+        makeModel(m);
+        QVERIFY(m.setQuery("SELECT A, B, Mark, Copies, Kind, Name FROM t ORDER BY A, B"));
+        QSignalSpy failed(&m, &BoundTableModel::writeFailed);
+        QVERIFY(!m.setData(m.index(1, 3), typed, Qt::EditRole));
+        QCOMPARE(failed.count(), 1);
+        const QString reason = failed.first().first().toString();
+        QVERIFY2(reason.contains("copies") && reason.contains("0") && reason.contains("32767") && reason.contains(typed),
+                 qPrintable(reason));
+        QCOMPARE(m.data(m.index(1, 3)).toString(), QString("3"));
+        QCOMPARE(rows(db, "SELECT group_concat(Copies) FROM t"), QStringList{"1,3,0"});
     }
 
     void shownTexts()

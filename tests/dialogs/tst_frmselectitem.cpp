@@ -4,6 +4,7 @@
 #include "dialogs/frmselectitem.h"
 #include "localdb/database.h"
 #include "localdb/schema.h"
+#include "platform/prompt.h"
 
 #include <QLineEdit>
 #include <QPushButton>
@@ -148,6 +149,33 @@ private slots:
         c<QLineEdit>(f, "txtToItemName")->setText(text);
         c<QPushButton>(f, QStringLiteral("cmdFindByDesc(%1)").arg(button))->click();
         QCOMPARE(f.model()->value(grid(f)->currentRowIndex(), "ItemKey").toString(), found);
+    }
+
+    // Copies typed into the grid: whole numbers 0 to 32767, or the reason
+    // why not, and the item keeps its copies.
+    void typedCopies_data()
+    {
+        QTest::addColumn<QString>("typed");
+        QTest::addColumn<QString>("stored");
+        QTest::newRow("a count") << "12" << "12";
+        QTest::newRow("letters") << "abc" << "1";
+        QTest::newRow("beyond 32767") << "70000" << "1";
+        QTest::newRow("negative") << "-3" << "1";
+    }
+    void typedCopies()
+    {
+        QFETCH(QString, typed);
+        QFETCH(QString, stored);
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('A1', 'x', 1, 1)");
+        auto prompt = std::make_shared<ScriptedPrompt>(nullptr);
+        FrmSelectItem f(folder, QString(), nullptr, prompt);
+        f.model()->setData(f.model()->index(0, 3), typed, Qt::EditRole);
+        QCOMPARE(rows(items, "SELECT Copies FROM tItems"), QStringList{stored});
+        QCOMPARE(grid(f)->text(0, 3), stored);
+        const bool refused = stored != typed;
+        QCOMPARE(prompt->lines().size(), refused ? 1 : 0);
+        if (refused)
+            QVERIFY2(prompt->lines().first().contains(QString::fromUtf8("עותקים")), qPrintable(prompt->lines().first()));
     }
 
     // The card column opens the row's item from the source chosen, and the
