@@ -7,6 +7,7 @@
 
 #include <algorithm>
 
+
 namespace tagora {
 
 BoundTableModel::BoundTableModel(QObject* parent)
@@ -127,9 +128,27 @@ QVariant BoundTableModel::data(const QModelIndex& index, int role) const
             return c.icon.isNull() ? QVariant() : QVariant(c.icon);
         return QVariant();
     case Qt::TextAlignmentRole:
-        return QVariant::fromValue(c.alignment);
+        return QVariant::fromValue(alignment(c, index));
     default:
         return QVariant();
+    }
+}
+
+Qt::Alignment BoundTableModel::alignment(const BoundColumn& c, const QModelIndex& index) const
+{
+    if (c.alignment)
+        return c.alignment;
+    // Absolute sides: the grid is right to left, but a Latin text still
+    // starts at the left and a number's units still line up at the right.
+    switch (c.kind) {
+    case BoundColumn::Kind::Number:
+        return Qt::AlignRight | Qt::AlignAbsolute | Qt::AlignVCenter;
+    case BoundColumn::Kind::Text:
+    case BoundColumn::Kind::Choice:
+        return (data(index, Qt::DisplayRole).toString().isRightToLeft() ? Qt::AlignRight : Qt::AlignLeft)
+            | Qt::AlignAbsolute | Qt::AlignVCenter;
+    default:
+        return Qt::AlignCenter;
     }
 }
 
@@ -257,6 +276,7 @@ void BoundGrid::setBoundModel(BoundTableModel* model)
 {
     m_model = model;
     setModel(model);
+    setItemDelegate(new BoundItemDelegate(this));
     for (int c = 0; c < model->columns().size(); ++c)
         if (model->columns()[c].kind == BoundColumn::Kind::Choice)
             setItemDelegateForColumn(c, new ChoiceDelegate(this));
@@ -297,6 +317,13 @@ QString BoundGrid::text(int row, int column) const
     if (m_model->columns()[column].kind == BoundColumn::Kind::Check)
         return m_model->data(i, Qt::CheckStateRole).toInt() == Qt::Checked ? QStringLiteral("1") : QStringLiteral("0");
     return m_model->data(i, Qt::DisplayRole).toString();
+}
+
+void BoundItemDelegate::initStyleOption(QStyleOptionViewItem* option, const QModelIndex& index) const
+{
+    QStyledItemDelegate::initStyleOption(option, index);
+    if (option->features.testFlag(QStyleOptionViewItem::HasDisplay))
+        option->direction = option->text.isRightToLeft() ? Qt::RightToLeft : Qt::LeftToRight;
 }
 
 QWidget* ChoiceDelegate::createEditor(QWidget* parent, const QStyleOptionViewItem&, const QModelIndex& index) const

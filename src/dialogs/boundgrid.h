@@ -18,7 +18,10 @@ struct BoundColumn {
     QString header;
     Kind kind = Kind::Text;
     bool editable = false;
-    Qt::Alignment alignment = Qt::AlignRight | Qt::AlignVCenter;
+    // None given: texts align to the side their own reading direction starts
+    // from (Hebrew right, Latin left), numbers right so their digits line up,
+    // check boxes and pictures in the middle.
+    Qt::Alignment alignment;
     // Number: the whole numbers a cell takes; anything else typed is refused.
     qlonglong minimum = std::numeric_limits<int>::min();
     qlonglong maximum = std::numeric_limits<int>::max();
@@ -28,7 +31,7 @@ struct BoundColumn {
 };
 
 inline BoundColumn boundColumn(const QString& field, const QString& header, BoundColumn::Kind kind,
-                               bool editable = false, Qt::Alignment alignment = Qt::AlignRight | Qt::AlignVCenter)
+                               bool editable = false, Qt::Alignment alignment = {})
 {
     BoundColumn c;
     c.field = field;
@@ -77,6 +80,7 @@ signals:
 private:
     int fieldIndex(const QString& field) const;
     QString choiceText(const BoundColumn& c, const QVariant& v) const;
+    Qt::Alignment alignment(const BoundColumn& c, const QModelIndex& index) const;
 
     QString m_dbPath;
     QString m_base;
@@ -113,11 +117,22 @@ private:
     BoundTableModel* m_model = nullptr;
 };
 
-// Edits a Choice column with a list of the shown texts.
-class ChoiceDelegate : public QStyledItemDelegate {
+// Draws each cell's text in its own reading direction, so a Latin key keeps
+// its punctuation in place on a right-to-left grid.
+class BoundItemDelegate : public QStyledItemDelegate {
     Q_OBJECT
 public:
     using QStyledItemDelegate::QStyledItemDelegate;
+
+protected:
+    void initStyleOption(QStyleOptionViewItem* option, const QModelIndex& index) const override;
+};
+
+// Edits a Choice column with a list of the shown texts.
+class ChoiceDelegate : public BoundItemDelegate {
+    Q_OBJECT
+public:
+    using BoundItemDelegate::BoundItemDelegate;
     QWidget* createEditor(QWidget* parent, const QStyleOptionViewItem&, const QModelIndex& index) const override;
     void setEditorData(QWidget* editor, const QModelIndex& index) const override;
     void setModelData(QWidget* editor, QAbstractItemModel* model, const QModelIndex& index) const override;

@@ -118,6 +118,44 @@ private slots:
         QCOMPARE(rows(db, "SELECT group_concat(Copies) FROM t"), QStringList{"1,3,0"});
     }
 
+    // Cells read from the side their text starts on, whatever the grid's
+    // direction: Hebrew from the right, Latin from the left; numbers line up right.
+    void alignmentAndDirection_data()
+    {
+        QTest::addColumn<int>("row");
+        QTest::addColumn<int>("column");
+        QTest::addColumn<int>("alignment");
+        QTest::addColumn<int>("direction");
+        const int right = Qt::AlignRight | Qt::AlignAbsolute | Qt::AlignVCenter;
+        const int left = Qt::AlignLeft | Qt::AlignAbsolute | Qt::AlignVCenter;
+        QTest::newRow("Hebrew text") << 0 << 5 << right << int(Qt::RightToLeft);
+        QTest::newRow("Latin text") << 1 << 5 << left << int(Qt::LeftToRight);
+        QTest::newRow("Latin key with a quote") << 2 << 1 << left << int(Qt::LeftToRight);
+        QTest::newRow("number") << 0 << 3 << right << int(Qt::LeftToRight);
+        QTest::newRow("check box") << 0 << 2 << int(Qt::AlignCenter) << -1;
+    }
+    void alignmentAndDirection()
+    {
+        QFETCH(int, row);
+        QFETCH(int, column);
+        QFETCH(int, alignment);
+        QFETCH(int, direction);
+        BoundTableModel m;
+        makeModel(m);
+        QVERIFY(m.setQuery(QString::fromUtf8("SELECT A, B, Mark, Copies, Kind, CASE WHEN A = 'x' AND B = 1 THEN 'בורג M6'"
+                                             " ELSE 'Bolt M6' END AS Name FROM t ORDER BY A, B")));
+        QCOMPARE(m.data(m.index(row, column), Qt::TextAlignmentRole).value<Qt::Alignment>(), Qt::Alignment(alignment));
+        if (direction < 0)
+            return;
+        struct Open : BoundItemDelegate {
+            using BoundItemDelegate::initStyleOption;
+        } delegate;
+        QStyleOptionViewItem option;
+        option.direction = direction == Qt::RightToLeft ? Qt::LeftToRight : Qt::RightToLeft;
+        delegate.initStyleOption(&option, m.index(row, column));
+        QCOMPARE(int(option.direction), direction);
+    }
+
     void shownTexts()
     {
         BoundTableModel m;
