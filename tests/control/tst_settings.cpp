@@ -285,35 +285,6 @@ private slots:
         QCOMPARE(get(f, "lblVarNum(7)"), QString("4"));
     }
 
-    // What this store writes, it reads back unchanged.
-    void storeRoundTrip_data()
-    {
-        QTest::addColumn<QString>("value");
-        QTest::newRow("commas") << "#,##0.00";
-        QTest::newRow("comma and blank") << "Acme, Ltd";
-        QTest::newRow("quotes") << "say \"hi\", \"bye\"";
-        QTest::newRow("leading and trailing blanks") << "  3 ";
-        QTest::newRow("backslashes") << "\\\\server\\share, c:\\x";
-        QTest::newRow("Hebrew") << QString::fromUtf8("חברת \"אלף\", בע'מ");
-        QTest::newRow("comment and equals signs") << "a;b=c";
-        QTest::newRow("at sign") << "@start, @end";
-        QTest::newRow("empty") << "";
-    }
-    void storeRoundTrip()
-    {
-        QFETCH(QString, value);
-        QTemporaryDir dir;
-        const QString path = dir.filePath("t.ini");
-        {
-            IniSettingsStore store(path);
-            QVERIFY(store.setValue("Tagora", "LabelVars", "PriceFormat", value));
-            QVERIFY(store.setValue("OtherApp", "S", "K", value));
-        }
-        IniSettingsStore store(path);
-        QCOMPARE(store.value("Tagora", "LabelVars", "PriceFormat").value_or("<missing>"), value);
-        QCOMPARE(store.value("OtherApp", "S", "K").value_or("<missing>"), value);
-    }
-
     void corruptFileGivesDefaultsAndIsNotOverwritten()
     {
         QByteArray garbage("[GeneralParams\n\x01\x02\xff\xfe=\n=====\n[\n");
