@@ -4,6 +4,8 @@
 #include <QDateTime>
 #include <QRegularExpression>
 
+#include <algorithm>
+
 #include <sql.h>
 #include <sqlext.h>
 #include <sqlucode.h>
@@ -23,9 +25,11 @@ SQLWCHAR* wptr(std::u16string& s)
     return reinterpret_cast<SQLWCHAR*>(s.data());
 }
 
+// Code units as they are: a long value comes in pieces, and a piece may start
+// with U+FEFF, which QString::fromUtf16 would take for a byte order mark and drop.
 QString fromWide(const SQLWCHAR* s, qsizetype chars)
 {
-    return QString::fromUtf16(reinterpret_cast<const char16_t*>(s), chars);
+    return QString(reinterpret_cast<const QChar*>(s), chars);
 }
 
 QString diagnostics(SQLSMALLINT type, SQLHANDLE handle)
