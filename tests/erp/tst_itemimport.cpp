@@ -21,9 +21,9 @@ namespace {
 const QString kDsn1 = QStringLiteral("TagoraDemo1");
 const QString kDsn2 = QStringLiteral("TagoraDemo2");
 
-QString conn(short type)
+QString conn(short type, const QString& dsn = QString())
 {
-    return BuildConnString(type == 1 ? kDsn1 : kDsn2, "sa", QVariant(), "demo", type);
+    return BuildConnString(dsn.isEmpty() ? (type == 1 ? kDsn1 : kDsn2) : dsn, "sa", QVariant(), "demo", type);
 }
 
 } // namespace
@@ -54,7 +54,29 @@ class TestItemImport : public QObject {
         return path;
     }
 
-    ErpReadContext ctx(short type) { return ErpReadContext{conn(type), nullptr, QString(), today}; }
+    ErpReadContext ctx(short type, const QString& dsn = QString())
+    {
+        return ErpReadContext{conn(type, dsn), nullptr, QString(), today};
+    }
+
+    // A copy of a demo company, changed by sql, behind a data source of its own.
+    QString addVariant(const QString& dsn, const QString& from, const QString& sql)
+    {
+        const QString path = odbc.dir.filePath(dsn + QStringLiteral(".sqlite"));
+        QFile::remove(path);
+        if (!QFile::copy(from, path))
+            qFatal("cannot copy %s", qPrintable(from));
+        {
+            Database d;
+            DbError e = d.open(path);
+            if (!e)
+                e = d.exec(sql);
+            if (e)
+                qFatal("%s", qPrintable(e.message));
+        }
+        odbc.addDsn(dsn, {{QStringLiteral("Driver"), QStringLiteral("SQLite3")}, {QStringLiteral("Database"), path}});
+        return path;
+    }
 
 private slots:
     void initTestCase()
@@ -62,9 +84,13 @@ private slots:
         DemoOptions o;
         o.today = today;
         o.connType = 1;
-        odbc.addDemo(kDsn1, o);
+        const QString erp1 = odbc.addDemo(kDsn1, o);
         o.connType = 2;
         erp2 = odbc.addDemo(kDsn2, o);
+        // Dates stored with a time, as an ERP on a date-time column keeps them.
+        for (const auto& [dsn, time] : {std::pair{"TagoraMidnight", " 00:00:00"}, {"TagoraMorning", " 08:30:00"}})
+            addVariant(dsn, erp1, QStringLiteral("UPDATE CUSTPARTPRICE SET FROMDATE = FROMDATE || '%1',"
+                                                 " EXPIRYDATE = EXPIRYDATE || '%1'").arg(time));
     }
 
     // Both connection types describe the same company: once converted, the
@@ -176,19 +202,25 @@ private slots:
         QVERIFY(ReadItemPriority(ctx(2), db, "2'00", "", false, 1, 0, false, false, &e));
     }
 
-    // Special prices valid today: the day a price ends is still in, the day after it starts is not yet.
+    // Special prices valid today: the days a price starts and ends are in,
+    // whether or not the ERP keeps a time with its dates; the day before a price starts is not.
     void specialPriceWindow_data()
     {
         QTest::addColumn<int>("type");
-        QTest::newRow("dates as dates") << 1;
-        QTest::newRow("dates as minutes") << 2;
+        QTest::addColumn<QString>("dsn");
+        QTest::newRow("dates as dates") << 1 << QString();
+        QTest::newRow("dates with midnight") << 1 << "TagoraMidnight";
+        QTest::newRow("dates with a time of day") << 1 << "TagoraMorning";
+        QTest::newRow("dates as minutes") << 2 << QString();
     }
     void specialPriceWindow()
     {
         QFETCH(int, type);
+        QFETCH(QString, dsn);
         const QString staging = newStaging(newItemsDb());
         ReadError e;
-        QVERIFY2(ReadAlterPricePRIORITY(ctx(short(type)), staging, false, "tTempAlterPrices", &e), qPrintable(e.message));
+        QVERIFY2(ReadAlterPricePRIORITY(ctx(short(type), dsn), staging, false, "tTempAlterPrices", &e),
+                 qPrintable(e.message));
         const int todayMinutes = int(QDate(1988, 1, 1).daysTo(today)) * 1440;
         const QString window = QStringLiteral("FROMDATE <= %1 AND EXPIRYDATE >= %1").arg(todayMinutes);
         // A repeated account and item is staged once.
@@ -199,6 +231,7 @@ private slots:
         // The item key takes an apostrophe for its double quote, as in tItems, so the price is found for it.
         QVERIFY(expected.contains("CH-100|AB'12"));
         QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE EXPIRYDATE = %1").arg(todayMinutes)).toInt() > 0);
+        QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE FROMDATE = %1").arg(todayMinutes)).toInt() > 0);
         QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE FROMDATE = %1").arg(todayMinutes + 1440)).toInt() > 0);
     }
 

@@ -199,7 +199,15 @@ private slots:
         QTest::addColumn<QString>("sql");
         QTest::addColumn<QString>("sent");
         QTest::newRow("unicode literal") << "WHERE A = N'שלום'" << "WHERE A = 'שלום'";
-        QTest::newRow("date literal") << "D >= #05/03/2024# AND D <= #5/3/2024#" << "D >= '2024-03-05' AND D <= '2024-03-05'";
+        // A stored time must not put a date after the literal of its own day.
+        QTest::newRow("date literal, column by its day")
+            << "T.D >= #05/03/2024# AND D<=#5/3/2024#" << "date(T.D) >= '2024-03-05' AND date(D)<='2024-03-05'";
+        QTest::newRow("column after the literal") << "WHERE #05/03/2024# <> T.D" << "WHERE '2024-03-05' <> date(T.D)";
+        QTest::newRow("no column to compare") << "SELECT #05/03/2024#, f(X) >= #05/03/2024#"
+                                              << "SELECT '2024-03-05', f(X) >= '2024-03-05'";
+        QTest::newRow("function after the literal") << "#05/03/2024# = f(X)" << "'2024-03-05' = f(X)";
+        QTest::newRow("end of a case") << "CASE WHEN A THEN D END >= #05/03/2024#"
+                                       << "CASE WHEN A THEN D END >= '2024-03-05'";
         QTest::newRow("inside a string untouched") << "WHERE A = 'N''#05/03/2024#'" << "WHERE A = 'N''#05/03/2024#'";
         QTest::newRow("identifier ending in N") << "SELECT PARTN'x'" << "SELECT PARTN'x'";
         QTest::newRow("plain") << "SELECT 1" << "SELECT 1";
