@@ -33,6 +33,7 @@ class TestItemImport : public QObject {
     OdbcSandbox odbc;
     QTemporaryDir work;
     QString erp2;
+    QString wideLists;
     QDate today = QDate::currentDate();
     int fresh = 0;
 
@@ -91,6 +92,15 @@ private slots:
         for (const auto& [dsn, time] : {std::pair{"TagoraMidnight", " 00:00:00"}, {"TagoraMorning", " 08:30:00"}})
             addVariant(dsn, erp1, QStringLiteral("UPDATE CUSTPARTPRICE SET FROMDATE = FROMDATE || '%1',"
                                                  " EXPIRYDATE = EXPIRYDATE || '%1'").arg(time));
+        // Price lists numbered beyond 16 bits, one price per item; 65537 shares
+        // its low 16 bits with list 1.
+        wideLists = addVariant(
+            "TagoraWideLists", erp2,
+            "INSERT INTO PRICELIST (PLIST, PLNAME, PLDES) VALUES (40000, 'W40', 'Wide 40000'), (65537, 'W65', 'Wide 65537');"
+            "INSERT INTO PARTPRICE (PART, PLIST, QUANT, PRICE, CURRENCY) SELECT PART, 40000, QUANT, max(PRICE) + 2000,"
+            " CURRENCY FROM PARTPRICE WHERE PLIST = 1 AND PART % 2 = 0 GROUP BY PART;"
+            "INSERT INTO PARTPRICE (PART, PLIST, QUANT, PRICE, CURRENCY) SELECT PART, 65537, QUANT, max(PRICE) + 1000,"
+            " CURRENCY FROM PARTPRICE WHERE PLIST = 1 GROUP BY PART");
     }
 
     // Both connection types describe the same company: once converted, the
@@ -255,6 +265,38 @@ private slots:
         QVERIFY(UpdateMainItemTables(staging, &mergeError));
         QCOMPARE(rows(items, "SELECT * FROM tPriceList ORDER BY 1, 2"), rows(staging, "SELECT * FROM tTempPriceList ORDER BY 1, 2"));
         QCOMPARE(scalar(items, "SELECT count(*) FROM tAlterKeys").toInt(), scalar(staging, "SELECT count(*) FROM tTempAlterKeys").toInt());
+    }
+
+    // The list chosen on the tab is the list read, whatever its number.
+    void wideListNumbers_data()
+    {
+        QTest::addColumn<int>("priceList");
+        QTest::newRow("40000") << 40000;
+        QTest::newRow("65537") << 65537;
+    }
+    void wideListNumbers()
+    {
+        QFETCH(int, priceList);
+        const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
+        QVERIFY(!PrepareDataFolder(data));
+        CardFixture f(QStringLiteral("[Params]\nConnServer=TagoraWideLists\nConnType=1\n[GeneralParams]\nDBPath=%1\n")
+                          .arg(data)
+                          .toUtf8());
+        QVERIFY2(f.showMessages.isEmpty(), qPrintable(f.showMessages.join('\n')));
+        auto* list = f.c<QComboBox>("cmbPriceField");
+        QVERIFY(list->findData(priceList) >= 0);
+        list->setCurrentIndex(list->findData(priceList));
+        f.c<QPushButton>("CmdImportItems")->click();
+        QVERIFY2(f.prompt->criticalCount() == 0, qPrintable(f.prompt->lines().join('\n')));
+        const QStringList expected = rows(
+            wideLists,
+            QStringLiteral("SELECT replace(trim(PARTNAME), '\"', ''''), PRICE FROM PART, FAMILY, UNIT, PARTPRICE, CURRENCIES"
+                           " WHERE TYPE IN ('R','P') AND FAMILY.FAMILY = PART.FAMILY AND UNIT.UNIT = PART.UNIT"
+                           " AND PARTPRICE.PART = PART.PART AND PARTPRICE.PLIST = %1"
+                           " AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY AND trim(PARTNAME) <> '' ORDER BY 1")
+                .arg(priceList));
+        QVERIFY(expected.size() > 5);
+        QCOMPARE(rows(data + "/" + dbfiles::Items, "SELECT ItemKey, Price FROM tItems ORDER BY 1"), expected);
     }
 
     void unreachableErp_data()
