@@ -186,7 +186,7 @@ private:
     void showDialog(const QString& formName);
     int runDialog(QDialog& dialog);
     bool reportRead(bool ok, const ReadError& error);
-    short priceListNumber() const;
+    int priceListNumber() const;
 
     std::unique_ptr<Ui::MainCardForm> ui;
     Services m_services;

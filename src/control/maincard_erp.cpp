@@ -59,10 +59,10 @@ void MainCard::FillCmbPriceField()
         list->addItem(f.text, f.priceList);
 }
 
-short MainCard::priceListNumber() const
+int MainCard::priceListNumber() const
 {
     const int i = ui->cmbPriceField->currentIndex();
-    return i < 0 ? 0 : short(ui->cmbPriceField->itemData(i).toInt());
+    return i < 0 ? 0 : ui->cmbPriceField->itemData(i).toInt();
 }
 
 int MainCard::runDialog(QDialog& dialog)

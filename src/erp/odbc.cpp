@@ -4,6 +4,8 @@
 #include <QDateTime>
 #include <QRegularExpression>
 
+#include <algorithm>
+
 #include <sql.h>
 #include <sqlext.h>
 #include <sqlucode.h>
@@ -23,9 +25,11 @@ SQLWCHAR* wptr(std::u16string& s)
     return reinterpret_cast<SQLWCHAR*>(s.data());
 }
 
+// Code units as they are: a long value comes in pieces, and a piece may start
+// with U+FEFF, which QString::fromUtf16 would take for a byte order mark and drop.
 QString fromWide(const SQLWCHAR* s, qsizetype chars)
 {
-    return QString::fromUtf16(reinterpret_cast<const char16_t*>(s), chars);
+    return QString(reinterpret_cast<const QChar*>(s), chars);
 }
 
 QString diagnostics(SQLSMALLINT type, SQLHANDLE handle)
@@ -176,9 +180,31 @@ QString ErpConnection::currentCatalog() const
     return fromWide(name, len / qsizetype(sizeof(SQLWCHAR)));
 }
 
+namespace {
+// A column compared with a date literal, the column before the operator or
+// after it. Only a plain (possibly qualified) name is recognised; anything
+// else keeps the bare literal.
+const QString kColumn = QStringLiteral("[A-Za-z_][A-Za-z0-9_]*(?:\\.[A-Za-z_][A-Za-z0-9_]*)*");
+const QString kComparison = QStringLiteral("\\s*(?:<=|>=|<>|!=|=|<|>)\\s*");
+
+// SQLite keeps a date as text, with or without a time ("2024-03-05" or
+// "2024-03-05 00:00:00"), and compares text with text character by character,
+// so a stored time would put a day after the literal of that same day. The
+// literal names a day, so the column is taken to its day as well.
+QString dayOf(const QString& column)
+{
+    return QStringLiteral("date(") + column + QLatin1Char(')');
+}
+} // namespace
+
 QString ErpConnection::rewriteForSqlite(const QString& sql)
 {
     static const QRegularExpression dateLiteral(QStringLiteral("^#(\\d{1,2})/(\\d{1,2})/(\\d{4})#"));
+    // END closes a CASE expression; it names no column.
+    static const QRegularExpression columnBefore(QStringLiteral("(?<![\\w.\"])(?!(?i:END)\\b)(") + kColumn
+                                                 + QStringLiteral(")(") + kComparison + QStringLiteral(")$"));
+    static const QRegularExpression columnAfter(QStringLiteral("^(") + kComparison + QStringLiteral(")(") + kColumn
+                                                + QStringLiteral(")(?![\\w.\"]|\\s*\\()"));
     QString out;
     out.reserve(sql.size());
     bool quoted = false;
@@ -203,8 +229,21 @@ QString ErpConnection::rewriteForSqlite(const QString& sql)
             const auto m = dateLiteral.match(QStringView(sql).mid(i));
             if (m.hasMatch()) {
                 const QDate d(m.captured(3).toInt(), m.captured(2).toInt(), m.captured(1).toInt());
-                out += QLatin1Char('\'') + d.toString(Qt::ISODate) + QLatin1Char('\'');
+                const QString day = QLatin1Char('\'') + d.toString(Qt::ISODate) + QLatin1Char('\'');
                 i += int(m.capturedLength()) - 1;
+                // The column sits just before the literal: a look at the tail is enough.
+                const auto before = columnBefore.match(out, std::max<qsizetype>(0, out.size() - 256));
+                if (before.hasMatch()) {
+                    out.truncate(before.capturedStart());
+                    out += dayOf(before.captured(1)) + before.captured(2) + day;
+                    continue;
+                }
+                const auto after = columnAfter.match(QStringView(sql).mid(i + 1));
+                out += day;
+                if (after.hasMatch()) {
+                    out += after.captured(1) + dayOf(after.captured(2));
+                    i += int(after.capturedLength());
+                }
                 continue;
             }
         }

@@ -44,7 +44,9 @@ public:
 
     // The text actually sent for a query: SQLite, standing in for the ERP's
     // server, lacks two literal forms the readers use (N'text' and
-    // #dd/mm/yyyy#), so for SQLite alone they are rewritten.
+    // #dd/mm/yyyy#), so for SQLite alone they are rewritten. A date literal
+    // becomes 'yyyy-mm-dd', and a column compared with it is compared by its
+    // day (date(column)), since SQLite would compare a stored time as text.
     QString dialectSql(const QString& sql) const;
     static QString rewriteForSqlite(const QString& sql);
 

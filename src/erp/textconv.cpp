@@ -193,11 +193,19 @@ QString NullToNbsp(const QVariant& value)
     return value.toString();
 }
 
+// Blanks only: a tab, a line break or a no-break space at either end is part
+// of the ERP's value and stays.
 QString NullTrim(const QVariant& value)
 {
     if (isNullish(value))
         return QString();
-    return value.toString().trimmed();
+    const QString t = value.toString();
+    qsizetype from = 0, to = t.size();
+    while (from < to && t[from] == QLatin1Char(' '))
+        ++from;
+    while (to > from && t[to - 1] == QLatin1Char(' '))
+        --to;
+    return t.mid(from, to - from);
 }
 
 double NullToDouble(const QVariant& value)

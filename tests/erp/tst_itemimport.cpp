@@ -22,9 +22,9 @@ namespace {
 const QString kDsn1 = QStringLiteral("TagoraDemo1");
 const QString kDsn2 = QStringLiteral("TagoraDemo2");
 
-QString conn(short type)
+QString conn(short type, const QString& dsn = QString())
 {
-    return BuildConnString(type == 1 ? kDsn1 : kDsn2, "sa", QVariant(), "demo", type);
+    return BuildConnString(dsn.isEmpty() ? (type == 1 ? kDsn1 : kDsn2) : dsn, "sa", QVariant(), "demo", type);
 }
 
 } // namespace
@@ -34,6 +34,7 @@ class TestItemImport : public QObject {
     OdbcSandbox odbc;
     QTemporaryDir work;
     QString erp2;
+    QString wideLists;
     QDate today = QDate::currentDate();
     int fresh = 0;
 
@@ -55,7 +56,29 @@ class TestItemImport : public QObject {
         return path;
     }
 
-    ErpReadContext ctx(short type) { return ErpReadContext{conn(type), nullptr, QString(), today}; }
+    ErpReadContext ctx(short type, const QString& dsn = QString())
+    {
+        return ErpReadContext{conn(type, dsn), nullptr, QString(), today};
+    }
+
+    // A copy of a demo company, changed by sql, behind a data source of its own.
+    QString addVariant(const QString& dsn, const QString& from, const QString& sql)
+    {
+        const QString path = odbc.dir.filePath(dsn + QStringLiteral(".sqlite"));
+        QFile::remove(path);
+        if (!QFile::copy(from, path))
+            qFatal("cannot copy %s", qPrintable(from));
+        {
+            Database d;
+            DbError e = d.open(path);
+            if (!e)
+                e = d.exec(sql);
+            if (e)
+                qFatal("%s", qPrintable(e.message));
+        }
+        odbc.addDsn(dsn, {{QStringLiteral("Driver"), QStringLiteral("SQLite3")}, {QStringLiteral("Database"), path}});
+        return path;
+    }
 
 private slots:
     void initTestCase()
@@ -63,9 +86,22 @@ private slots:
         DemoOptions o;
         o.today = today;
         o.connType = 1;
-        odbc.addDemo(kDsn1, o);
+        const QString erp1 = odbc.addDemo(kDsn1, o);
         o.connType = 2;
         erp2 = odbc.addDemo(kDsn2, o);
+        // Dates stored with a time, as an ERP on a date-time column keeps them.
+        for (const auto& [dsn, time] : {std::pair{"TagoraMidnight", " 00:00:00"}, {"TagoraMorning", " 08:30:00"}})
+            addVariant(dsn, erp1, QStringLiteral("UPDATE CUSTPARTPRICE SET FROMDATE = FROMDATE || '%1',"
+                                                 " EXPIRYDATE = EXPIRYDATE || '%1'").arg(time));
+        // Price lists numbered beyond 16 bits, one price per item; 65537 shares
+        // its low 16 bits with list 1.
+        wideLists = addVariant(
+            "TagoraWideLists", erp2,
+            "INSERT INTO PRICELIST (PLIST, PLNAME, PLDES) VALUES (40000, 'W40', 'Wide 40000'), (65537, 'W65', 'Wide 65537');"
+            "INSERT INTO PARTPRICE (PART, PLIST, QUANT, PRICE, CURRENCY) SELECT PART, 40000, QUANT, max(PRICE) + 2000,"
+            " CURRENCY FROM PARTPRICE WHERE PLIST = 1 AND PART % 2 = 0 GROUP BY PART;"
+            "INSERT INTO PARTPRICE (PART, PLIST, QUANT, PRICE, CURRENCY) SELECT PART, 65537, QUANT, max(PRICE) + 1000,"
+            " CURRENCY FROM PARTPRICE WHERE PLIST = 1 GROUP BY PART");
     }
 
     // Both connection types describe the same company: once converted, the
@@ -177,19 +213,25 @@ private slots:
         QVERIFY(ReadItemPriority(ctx(2), db, "2'00", "", false, 1, 0, false, false, &e));
     }
 
-    // Special prices valid today: the day a price ends is still in, the day after it starts is not yet.
+    // Special prices valid today: the days a price starts and ends are in,
+    // whether or not the ERP keeps a time with its dates; the day before a price starts is not.
     void specialPriceWindow_data()
     {
         QTest::addColumn<int>("type");
-        QTest::newRow("dates as dates") << 1;
-        QTest::newRow("dates as minutes") << 2;
+        QTest::addColumn<QString>("dsn");
+        QTest::newRow("dates as dates") << 1 << QString();
+        QTest::newRow("dates with midnight") << 1 << "TagoraMidnight";
+        QTest::newRow("dates with a time of day") << 1 << "TagoraMorning";
+        QTest::newRow("dates as minutes") << 2 << QString();
     }
     void specialPriceWindow()
     {
         QFETCH(int, type);
+        QFETCH(QString, dsn);
         const QString staging = newStaging(newItemsDb());
         ReadError e;
-        QVERIFY2(ReadAlterPricePRIORITY(ctx(short(type)), staging, false, "tTempAlterPrices", &e), qPrintable(e.message));
+        QVERIFY2(ReadAlterPricePRIORITY(ctx(short(type), dsn), staging, false, "tTempAlterPrices", &e),
+                 qPrintable(e.message));
         const int todayMinutes = int(QDate(1988, 1, 1).daysTo(today)) * 1440;
         const QString window = QStringLiteral("FROMDATE <= %1 AND EXPIRYDATE >= %1").arg(todayMinutes);
         // A repeated account and item is staged once.
@@ -200,6 +242,7 @@ private slots:
         // The item key takes an apostrophe for its double quote, as in tItems, so the price is found for it.
         QVERIFY(expected.contains("CH-100|AB'12"));
         QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE EXPIRYDATE = %1").arg(todayMinutes)).toInt() > 0);
+        QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE FROMDATE = %1").arg(todayMinutes)).toInt() > 0);
         QVERIFY(scalar(erp2, QStringLiteral("SELECT count(*) FROM CUSTPARTPRICE WHERE FROMDATE = %1").arg(todayMinutes + 1440)).toInt() > 0);
     }
 
@@ -223,6 +266,38 @@ private slots:
         QVERIFY(UpdateMainItemTables(staging, &mergeError));
         QCOMPARE(rows(items, "SELECT * FROM tPriceList ORDER BY 1, 2"), rows(staging, "SELECT * FROM tTempPriceList ORDER BY 1, 2"));
         QCOMPARE(scalar(items, "SELECT count(*) FROM tAlterKeys").toInt(), scalar(staging, "SELECT count(*) FROM tTempAlterKeys").toInt());
+    }
+
+    // The list chosen on the tab is the list read, whatever its number.
+    void wideListNumbers_data()
+    {
+        QTest::addColumn<int>("priceList");
+        QTest::newRow("40000") << 40000;
+        QTest::newRow("65537") << 65537;
+    }
+    void wideListNumbers()
+    {
+        QFETCH(int, priceList);
+        const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
+        QVERIFY(!PrepareDataFolder(data));
+        CardFixture f(QStringLiteral("[Params]\nConnServer=TagoraWideLists\nConnType=1\n[GeneralParams]\nDBPath=%1\n")
+                          .arg(data)
+                          .toUtf8());
+        QVERIFY2(f.showMessages.isEmpty(), qPrintable(f.showMessages.join('\n')));
+        auto* list = f.c<QComboBox>("cmbPriceField");
+        QVERIFY(list->findData(priceList) >= 0);
+        list->setCurrentIndex(list->findData(priceList));
+        f.c<QPushButton>("CmdImportItems")->click();
+        QVERIFY2(f.prompt->criticalCount() == 0, qPrintable(f.prompt->lines().join('\n')));
+        const QStringList expected = rows(
+            wideLists,
+            QStringLiteral("SELECT replace(trim(PARTNAME), '\"', ''''), PRICE FROM PART, FAMILY, UNIT, PARTPRICE, CURRENCIES"
+                           " WHERE TYPE IN ('R','P') AND FAMILY.FAMILY = PART.FAMILY AND UNIT.UNIT = PART.UNIT"
+                           " AND PARTPRICE.PART = PART.PART AND PARTPRICE.PLIST = %1"
+                           " AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY AND trim(PARTNAME) <> '' ORDER BY 1")
+                .arg(priceList));
+        QVERIFY(expected.size() > 5);
+        QCOMPARE(rows(data + "/" + dbfiles::Items, "SELECT ItemKey, Price FROM tItems ORDER BY 1"), expected);
     }
 
     void unreachableErp_data()
