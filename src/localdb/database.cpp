@@ -436,14 +436,11 @@ void Database::openLinks()
     if (!hasCatalog)
         return;
     for (const auto& [table, source] : links()) {
-        QString path = source;
-        // A data folder that was moved or copied keeps working: a link whose
-        // source is gone looks for the same file beside this one.
-        if (!QFileInfo::exists(path)) {
-            const QString sibling = QFileInfo(m_path).dir().filePath(QFileInfo(source).fileName());
-            if (QFileInfo::exists(sibling))
-                path = sibling;
-        }
+        // The file of the same name beside this one comes first: a data folder
+        // that was copied must read its own files, not the folder it was copied
+        // from. The recorded path serves only when nothing is beside it.
+        const QString sibling = QFileInfo(m_path).dir().filePath(QFileInfo(source).fileName());
+        const QString path = QFileInfo::exists(sibling) ? sibling : source;
         if (QFileInfo::exists(path))
             aliasFor(path);
     }

@@ -202,24 +202,44 @@ private slots:
         QVERIFY(db.links().empty());
     }
 
-    // A copied or moved data folder keeps its links working.
-    void movedFolderFindsSiblingSource()
+    // A link reads the file of its name beside the linking file, so a data
+    // folder moved or copied elsewhere reads its own files; the recorded path
+    // serves only when nothing of that name is beside it.
+    void linkPrefersItsOwnFolder_data()
     {
-        QTemporaryDir a;
+        QTest::addColumn<bool>("copyItems");
+        QTest::addColumn<bool>("moveItems");
+        QTest::addColumn<QString>("read");
+        QTest::newRow("folder moved") << false << true << "original";
+        QTest::newRow("folder copied") << true << false << "copy";
+        QTest::newRow("linking file alone copied") << false << false << "original";
+    }
+    void linkPrefersItsOwnFolder()
+    {
+        QFETCH(bool, copyItems);
+        QFETCH(bool, moveItems);
+        QFETCH(QString, read);
+        QTemporaryDir a, b;
         {
             Database s;
             QVERIFY(!s.open(a.filePath("items.db"), Database::OpenMode::Create));
-            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('moved')"));
+            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('original')"));
             Database db;
             QVERIFY(!db.open(a.filePath("docs.db"), Database::OpenMode::Create));
             QVERIFY(!db.attachTable(a.filePath("items.db"), "tItems"));
         }
-        QTemporaryDir b;
-        QVERIFY(QFile::rename(a.filePath("items.db"), b.filePath("items.db")));
-        QVERIFY(QFile::rename(a.filePath("docs.db"), b.filePath("docs.db")));
+        QVERIFY(QFile::copy(a.filePath("docs.db"), b.filePath("docs.db")));
+        if (moveItems)
+            QVERIFY(QFile::rename(a.filePath("items.db"), b.filePath("items.db")));
+        if (copyItems) {
+            QVERIFY(QFile::copy(a.filePath("items.db"), b.filePath("items.db")));
+            Database copy;
+            QVERIFY(!copy.open(b.filePath("items.db")));
+            QVERIFY(!copy.exec("UPDATE tItems SET ItemKey = 'copy'"));
+        }
         Database db;
         QVERIFY(!db.open(b.filePath("docs.db")));
-        QCOMPARE(db.scalar("SELECT ItemKey FROM tItems").toString(), QString("moved"));
+        QCOMPARE(db.scalar("SELECT ItemKey FROM tItems").toString(), read);
     }
 };
 
