@@ -241,6 +241,66 @@ private slots:
         QVERIFY(!db.open(b.filePath("docs.db")));
         QCOMPARE(db.scalar("SELECT ItemKey FROM tItems").toString(), read);
     }
+
+    // A linked file that cannot serve: the file still opens, and what uses the
+    // table is told which file is wrong and how, directly or through a query.
+    void brokenLinkNamesItsFile_data()
+    {
+        QTest::addColumn<QByteArray>("content"); // of items.db; empty: no such file
+        QTest::addColumn<bool>("notFound");
+        QTest::addColumn<QString>("says");
+        QTest::newRow("missing") << QByteArray() << true << QString::fromUtf8("אינו נמצא");
+        QTest::newRow("not a database") << QByteArray(4096, 'x') << false
+                                        << QString::fromUtf8("אינו קובץ בסיס נתונים או שהוא פגום");
+        QTest::newRow("damaged") << QByteArray("damaged") << false
+                                 << QString::fromUtf8("אינו קובץ בסיס נתונים או שהוא פגום");
+        QTest::newRow("without the table") << QByteArray("other table") << true << QString::fromUtf8("אין טבלה");
+    }
+    void brokenLinkNamesItsFile()
+    {
+        QFETCH(QByteArray, content);
+        QFETCH(bool, notFound);
+        QFETCH(QString, says);
+        QTemporaryDir d;
+        const QString items = d.filePath("items.db");
+        {
+            Database s;
+            QVERIFY(!s.open(items, Database::OpenMode::Create));
+            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('A')"));
+            Database db;
+            QVERIFY(!db.open(d.filePath("docs.db"), Database::OpenMode::Create));
+            QVERIFY(!db.attachTable(items, "tItems"));
+            QVERIFY(!db.createQuery("qKeys", "SELECT ItemKey FROM tItems"));
+        }
+        if (content == "damaged") {
+            // A sound header over a schema page that is not one.
+            QFile f(items);
+            QVERIFY(f.open(QIODevice::ReadWrite));
+            QVERIFY(f.seek(100));
+            f.write(QByteArray(int(f.size()) - 100, '\xff'));
+        } else if (content == "other table") {
+            Database s;
+            QVERIFY(!s.open(items));
+            QVERIFY(!s.exec("DROP TABLE tItems; CREATE TABLE tOther (a)"));
+        } else {
+            QVERIFY(QFile::remove(items));
+            if (!content.isEmpty()) {
+                QFile f(items);
+                QVERIFY(f.open(QIODevice::WriteOnly));
+                f.write(content);
+            }
+        }
+        Database db;
+        QVERIFY(!db.open(d.filePath("docs.db")));
+        for (const char* sql : {"SELECT ItemKey FROM tItems", "SELECT * FROM qKeys"}) {
+            DbError e;
+            db.scalar(sql, &e);
+            QVERIFY(e.isError());
+            QVERIFY2(e.message.contains(QDir::toNativeSeparators(items)), qPrintable(e.message));
+            QVERIFY2(e.message.contains(says), qPrintable(e.message));
+            QCOMPARE(e.kind == DbError::Kind::NotFound, notFound);
+        }
+    }
 };
 
 QTEST_GUILESS_MAIN(TestDatabase)
