@@ -136,44 +136,6 @@ private slots:
         }
     }
 
-    void keysAndLayout_data()
-    {
-        QTest::addColumn<QString>("file");
-        QTest::addColumn<QString>("table");
-        QTest::addColumn<QStringList>("key");
-        QTest::addColumn<QString>("first");
-        QTest::addColumn<QString>("last");
-        QTest::addColumn<int>("count");
-        QTest::newRow("lines") << dbfiles::TempDocs << "tTempDocLines" << QStringList{"WizFileID", "HeadNumber", "LineNum"}
-                               << "WizFileID" << "Details" << 21;
-        QTest::newRow("headers") << dbfiles::TempDocs << "tTempDocHeaders" << QStringList{"WizFileID", "Number"}
-                                 << "WizFileID" << "OrigAccountKey" << 25;
-        QTest::newRow("label data") << dbfiles::TempDocs << "tPLabData" << QStringList{"KLine"} << "KLine" << "Par20" << 24;
-        QTest::newRow("items") << dbfiles::Items << "tItems" << QStringList{"ItemKey"} << "ItemKey" << "IgnoreInDoc" << 22;
-        QTest::newRow("price list") << dbfiles::Items << "tPriceList" << QStringList{"ItemKey", "PriceList"} << "ItemKey"
-                                    << "Currency" << 4;
-        QTest::newRow("staging items") << dbfiles::TempItems << "tTempItems" << QStringList{"ItemKey"} << "ItemKey"
-                                       << "IgnoreInDoc" << 22;
-    }
-    void keysAndLayout()
-    {
-        QFETCH(QString, file);
-        QFETCH(QString, table);
-        QFETCH(QStringList, key);
-        QFETCH(QString, first);
-        QFETCH(QString, last);
-        QFETCH(int, count);
-        Database db;
-        QVERIFY(!db.open(path(file)));
-        const QStringList cols = columnsOf(db, table);
-        QCOMPARE(cols.size(), count);
-        QCOMPARE(cols.first(), first);
-        QCOMPARE(cols.last(), last);
-        QCOMPARE(columnsOf(db, table, true), key);
-        const QString sql = db.scalar(QStringLiteral("SELECT sql FROM sqlite_master WHERE name='%1'").arg(table)).toString();
-        QVERIFY(sql.contains("CONSTRAINT PrimaryKey PRIMARY KEY"));
-    }
-
     void accountDefCountsItsOwnIds()
     {
         Database db;
