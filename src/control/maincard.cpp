@@ -20,6 +20,7 @@
 
 #include <QCheckBox>
 #include <QComboBox>
+#include <QDir>
 #include <QEvent>
 #include <QFileInfo>
 #include <QGridLayout>
@@ -547,6 +548,8 @@ void MainCard::printLabels(int queryType)
             return;
         }
     }
+    if (!caselessKeys(dataFile(dbfiles::Items)) || !caselessKeys(tempDocs))
+        return;
     const QString labelFile
         = control<QLabel>(queryType == 1 ? QStringLiteral("lblLabelName(1)") : QStringLiteral("lblLabelName(2)"))
               ->text()
@@ -570,15 +573,48 @@ void MainCard::printLabels(int queryType)
 
 // ------------------------------------------------------------------ upgrade
 
+bool MainCard::caselessKeys(const QString& path, bool quiet, CaselessKeysReport* done)
+{
+    if (!QFileInfo::exists(path))
+        return true;
+    CaselessKeysReport local;
+    CaselessKeysReport& report = done ? *done : local;
+    if (DbError e = UpgradeCaselessKeys(path, &report)) {
+        if (!quiet)
+            m_services.prompt->critical(titles::Fault, e.message);
+        return false;
+    }
+    if (report.setAside > 0)
+        m_services.prompt->message(
+            PromptIcon::Exclamation, titles::Attention,
+            QStringLiteral("מעתה אין הבדל בין אותיות גדולות לקטנות במפתחות. בקובץ '%1' נמצאו %2 רשומות שמפתחן "
+                           "זהה למפתח של רשומה אחרת פרט לגודל האותיות: מכל מפתח נשארה הרשומה הראשונה, והאחרות "
+                           "הועברו בשלמותן אל %3.")
+                .arg(QDir::toNativeSeparators(path))
+                .arg(report.setAside)
+                .arg(report.sideTables.join(QStringLiteral(", "))));
+    return true;
+}
+
 void MainCard::cmdUpgrade_Click()
 {
     const QString itemsDb = dataFile(dbfiles::Items);
     bool ok = false;
-    if (QFileInfo::exists(itemsDb)) {
-        DbError error;
-        ok = !UpgradeAccountDef(itemsDb, &error).isEmpty();
-        if (!ok)
-            m_services.prompt->critical(titles::Fault, error.message);
+    CaselessKeysReport keys;
+    if (QFileInfo::exists(itemsDb) && caselessKeys(itemsDb, false, &keys)) {
+        // A file whose definitions were upgraded long ago and only lacked
+        // caseless keys was upgraded now; that is not a second run.
+        Database db;
+        if (!keys.rebuilt.isEmpty() && !db.open(itemsDb)
+            && db.prepare(QStringLiteral("SELECT FldID, FldMaxLen, Label2Name FROM tAccountDef")).isValid()) {
+            ok = true;
+        } else {
+            db.close();
+            DbError error;
+            ok = !UpgradeAccountDef(itemsDb, &error).isEmpty();
+            if (!ok)
+                m_services.prompt->critical(titles::Fault, error.message);
+        }
     }
     setProgress(1.0);
     setMessage(ok ? QStringLiteral("השדרוג הסתיים בהצלחה") : QStringLiteral("השדרוג נכשל"));
@@ -592,6 +628,9 @@ void MainCard::cmdSelectItems_Click()
     m_shared.itemRangeCriteria = itemRangeCriteria();
     m_shared.itemTextRtl = ui->chkItmRTL->isChecked();
     m_shared.objectRef = this;
+    // The selection searches by key, so an older file gets caseless keys first;
+    // like the rest of this sequence, a failure only leaves things as they were.
+    caselessKeys(dataFile(dbfiles::Items), true);
     FrmSelectItem dialog(m_shared.dataFolder, m_shared.itemRangeCriteria, this, m_services.prompt, this);
     runDialog(dialog);
 }

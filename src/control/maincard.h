@@ -22,6 +22,7 @@ namespace tagora {
 
 class CommonDialog;
 struct ReadError;
+struct CaselessKeysReport;
 
 // What the control hands to a dialog before it opens it.
 struct SharedDialogState {
@@ -173,6 +174,9 @@ private:
     void cmdSaveDef_Click(int section);
 
     void printLabels(int queryType);
+    // Brings a file of an earlier version to keys that ignore case, telling
+    // the user of rows set aside; false when that failed (shown unless quiet).
+    bool caselessKeys(const QString& path, bool quiet = false, CaselessKeysReport* done = nullptr);
 
     // Work that other parts of the system do for the commands above.
     bool SetDefaultPrinter(const QString& printer, QString* error);

@@ -228,6 +228,8 @@ void MainCard::ImportItems()
     }
     if ((e = PrepareDataFolder(folder)))
         return fail(e.message);
+    if (!caselessKeys(itemsDb))
+        return;
     if (CreateTempItemsDB(tempItemsDb, itemsDb, &e).isEmpty())
         return fail(e.message);
     const short foreign = ui->CmbItemNameType->currentIndex() == 1 ? -1 : 0;

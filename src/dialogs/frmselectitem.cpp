@@ -154,7 +154,8 @@ void FrmSelectItem::cmdFindKey_Click()
         if (!grid->text(row, 1).startsWith(key, Qt::CaseInsensitive))
             continue;
         grid->setCurrentRowIndex(row);
-        if (grid->text(row, 1) == key)
+        // Keys ignore case, as the items table does: el-1019 is item EL-1019.
+        if (grid->text(row, 1).compare(key, Qt::CaseInsensitive) == 0)
             m_model->setData(m_model->index(row, 2), Qt::Checked, Qt::CheckStateRole);
         return;
     }

@@ -70,8 +70,9 @@ CREATE TABLE tWizFileRanges (
 );
 INSERT INTO tWizFileRanges SELECT DocType, 0, 0 FROM tDocTypes;
 
+-- Coin is the ERP's currency code, a key that ignores case like every key here.
 CREATE TABLE tCurrencies (
-  Coin TEXT(5) NOT NULL,
+  Coin TEXT(5) NOT NULL COLLATE NOCASE,
   CoinDesc TEXT(50),
   CoinSign TEXT(5),
   CONSTRAINT PrimaryKey PRIMARY KEY (Coin)

@@ -269,6 +269,18 @@ DbError Database::lastError(int rc) const
         e.kind = DbError::Kind::DuplicateKey;
     else if ((e.code & 0xff) == SQLITE_CANTOPEN)
         e.kind = DbError::Kind::NotFound;
+    // A linked table that is not there because its file could not be linked:
+    // the engine only knows the name is unknown; say what is wrong with the file.
+    static const QLatin1String unknownTable("no such table: ");
+    if (!m_linkProblems.empty() && e.message.startsWith(unknownTable)) {
+        QString name = e.message.mid(unknownTable.size()).trimmed();
+        name = name.mid(name.lastIndexOf(QLatin1Char('.')) + 1);
+        const auto problem = m_linkProblems.find(name.toLower());
+        if (problem != m_linkProblems.end()) {
+            e.kind = problem->second.kind;
+            e.message = problem->second.message;
+        }
+    }
     return e;
 }
 
@@ -317,6 +329,7 @@ void Database::close()
         m_db = nullptr;
     }
     m_attached.clear();
+    m_linkProblems.clear();
     m_path.clear();
 }
 
@@ -410,7 +423,7 @@ DbError Database::ensureCatalog()
                     .arg(kCatalogTable));
 }
 
-QString Database::aliasFor(const QString& sourcePath)
+QString Database::aliasFor(const QString& sourcePath, DbError* error)
 {
     for (const auto& [path, alias] : m_attached)
         if (path == sourcePath)
@@ -418,10 +431,44 @@ QString Database::aliasFor(const QString& sourcePath)
     const QString alias = QStringLiteral("link%1").arg(m_attached.size() + 1);
     Statement s = prepare(QStringLiteral("ATTACH DATABASE ?1 AS %1").arg(alias));
     s.bind(1, sourcePath);
-    if (s.run())
+    if (DbError e = s.run()) {
+        if (error)
+            *error = e;
         return QString();
+    }
     m_attached.emplace_back(sourcePath, alias);
     return alias;
+}
+
+DbError Database::linkProblem(LinkFault fault, const QString& table, const QString& path, const QString& recorded,
+                              const DbError& cause)
+{
+    const QString file = QDir::toNativeSeparators(path);
+    switch (fault) {
+    case LinkFault::Missing: {
+        QString text = QStringLiteral("הטבלה '%1' מקושרת לקובץ '%2', והקובץ אינו נמצא.").arg(table, file);
+        if (QFileInfo(recorded).absoluteFilePath() != QFileInfo(path).absoluteFilePath())
+            text += QStringLiteral(" גם בנתיב שנרשם בקישור, '%1', אין קובץ כזה.").arg(QDir::toNativeSeparators(recorded));
+        return DbError::notFound(text);
+    }
+    case LinkFault::NoTable:
+        return DbError::notFound(
+            QStringLiteral("בקובץ '%1', שהטבלה '%2' מקושרת אליו, אין טבלה בשם זה.").arg(file, table));
+    case LinkFault::Unreadable: break;
+    }
+    switch (cause.code & 0xff) {
+    case SQLITE_NOTADB:
+    case SQLITE_CORRUPT:
+        return DbError::other(
+            QStringLiteral("הקובץ '%1', שהטבלה '%2' מקושרת אליו, אינו קובץ בסיס נתונים או שהוא פגום.").arg(file, table));
+    case SQLITE_BUSY:
+    case SQLITE_LOCKED:
+        return DbError::other(
+            QStringLiteral("הקובץ '%1', שהטבלה '%2' מקושרת אליו, תפוס בידי תוכנה אחרת.").arg(file, table));
+    default:
+        return DbError::other(QStringLiteral("לא ניתן לפתוח את הקובץ '%1', שהטבלה '%2' מקושרת אליו: %3")
+                                  .arg(file, table, cause.message));
+    }
 }
 
 void Database::openLinks()
@@ -435,17 +482,42 @@ void Database::openLinks()
         > 0;
     if (!hasCatalog)
         return;
+    std::map<QString, DbError> failedFiles;
     for (const auto& [table, source] : links()) {
-        QString path = source;
-        // A data folder that was moved or copied keeps working: a link whose
-        // source is gone looks for the same file beside this one.
+        // The file of the same name beside this one comes first: a data folder
+        // that was copied must read its own files, not the folder it was copied
+        // from. The recorded path serves only when nothing is beside it.
+        const QString sibling = QFileInfo(m_path).dir().filePath(QFileInfo(source).fileName());
+        const QString path = QFileInfo::exists(sibling) ? sibling : source;
+        // A link that cannot be made is remembered, not fatal: the file still
+        // opens, and only a statement that uses the table fails, saying why.
+        const QString key = table.toLower();
         if (!QFileInfo::exists(path)) {
-            const QString sibling = QFileInfo(m_path).dir().filePath(QFileInfo(source).fileName());
-            if (QFileInfo::exists(sibling))
-                path = sibling;
+            m_linkProblems[key] = linkProblem(LinkFault::Missing, table, sibling, source);
+            continue;
         }
-        if (QFileInfo::exists(path))
-            aliasFor(path);
+        // A file that failed once is not tried again for its other tables:
+        // a locked one would make each of them wait.
+        const auto failed = failedFiles.find(path);
+        if (failed != failedFiles.end()) {
+            m_linkProblems[key] = linkProblem(LinkFault::Unreadable, table, path, source, failed->second);
+            continue;
+        }
+        DbError attachError;
+        const QString alias = aliasFor(path, &attachError);
+        if (alias.isEmpty()) {
+            failedFiles[path] = attachError;
+            m_linkProblems[key] = linkProblem(LinkFault::Unreadable, table, path, source, attachError);
+            continue;
+        }
+        Statement check = prepare(
+            QStringLiteral("SELECT count(*) FROM %1.sqlite_master WHERE type='table' AND name=?1 COLLATE NOCASE")
+                .arg(alias));
+        check.bind(1, table);
+        if (check.step() != Statement::Step::Row)
+            m_linkProblems[key] = linkProblem(LinkFault::Unreadable, table, path, source, check.error());
+        else if (check.value(0).toInt() == 0)
+            m_linkProblems[key] = linkProblem(LinkFault::NoTable, table, path, source);
     }
     Statement q = prepare(
         QStringLiteral("SELECT Name, SqlText FROM main.%1 WHERE Kind='select' ORDER BY Seq").arg(kCatalogTable));
@@ -466,7 +538,7 @@ DbError Database::attachTable(const QString& sourcePath, const QString& table)
     const QString path = QFileInfo(sourcePath).absoluteFilePath();
     if (!QFileInfo::exists(path))
         return DbError::notFound(objectNotFound(table, sourcePath));
-    const QString alias = aliasFor(path);
+    const QString alias = aliasFor(path, nullptr);
     if (alias.isEmpty())
         return DbError::notFound(objectNotFound(table, sourcePath));
     Statement check = prepare(

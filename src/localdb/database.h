@@ -3,6 +3,7 @@
 #include <QString>
 #include <QStringList>
 #include <QVariant>
+#include <map>
 #include <memory>
 #include <vector>
 
@@ -81,7 +82,11 @@ private:
 
 // One local database file, opened with its links: every table linked into the
 // file is reachable under its own name, and every stored query is there as a
-// view under its name. Closing (or destroying) releases the file.
+// view under its name. A link reads the file of its source's name beside this
+// file when there is one, else the path it recorded. A link whose file is
+// missing, damaged or lacks the table does not stop the open; a statement that
+// uses the table fails with an error naming the file and what is wrong with it.
+// Closing (or destroying) releases the file.
 class Database {
 public:
     enum class OpenMode { ReadWrite, ReadOnly, Create };
@@ -139,14 +144,19 @@ public:
     DbError lastError(int rc) const;
 
 private:
+    enum class LinkFault { Missing, NoTable, Unreadable };
+
     DbError ensureCatalog();
     void openLinks();
     void createQueryView(const QString& name, const QString& sql);
-    QString aliasFor(const QString& sourcePath);
+    QString aliasFor(const QString& sourcePath, DbError* error);
+    static DbError linkProblem(LinkFault fault, const QString& table, const QString& path, const QString& recorded,
+                               const DbError& cause = {});
 
     sqlite3* m_db = nullptr;
     QString m_path;
     std::vector<std::pair<QString, QString>> m_attached; // source path -> alias
+    std::map<QString, DbError> m_linkProblems;            // lower-case linked table -> why it is not there
 };
 
 // Begins a transaction and rolls it back unless committed.

@@ -5,6 +5,9 @@
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QRegularExpression>
+
+#include <algorithm>
 
 namespace tagora {
 
@@ -179,6 +182,238 @@ QString createDatabase(const QString& path, const std::vector<TableDef>& tables,
     db.close();
     return path;
 }
+
+// A CREATE TABLE text in its parts: the column and table-constraint
+// definitions split at their top-level commas, and what follows the list.
+struct TableText {
+    QStringList parts;
+    QString tail;
+    bool ok = false;
+};
+
+TableText splitTableSql(const QString& sql)
+{
+    TableText t;
+    const int open = sql.indexOf(QLatin1Char('('));
+    if (open < 0)
+        return t;
+    int depth = 0;
+    int start = open + 1;
+    QChar closing;
+    for (int i = open; i < sql.size(); ++i) {
+        const QChar c = sql[i];
+        if (!closing.isNull()) {
+            if (c == closing)
+                closing = QChar();
+            continue;
+        }
+        if (c == QLatin1Char('\'') || c == QLatin1Char('"') || c == QLatin1Char('`'))
+            closing = c;
+        else if (c == QLatin1Char('['))
+            closing = QLatin1Char(']');
+        else if (c == QLatin1Char('('))
+            ++depth;
+        else if (c == QLatin1Char(',') && depth == 1) {
+            t.parts << sql.mid(start, i - start).trimmed();
+            start = i + 1;
+        } else if (c == QLatin1Char(')') && --depth == 0) {
+            t.parts << sql.mid(start, i - start).trimmed();
+            t.tail = sql.mid(i + 1);
+            t.ok = true;
+            return t;
+        }
+    }
+    return t;
+}
+
+// The column a definition declares, or empty text for a table constraint.
+QString definedColumn(const QString& part)
+{
+    if (part.isEmpty())
+        return QString();
+    const QChar first = part[0];
+    if (first == QLatin1Char('"') || first == QLatin1Char('`') || first == QLatin1Char('[')) {
+        const QChar closing = first == QLatin1Char('[') ? QLatin1Char(']') : first;
+        const int end = part.indexOf(closing, 1);
+        return end < 0 ? QString() : part.mid(1, end - 1);
+    }
+    int end = 0;
+    while (end < part.size() && !part[end].isSpace())
+        ++end;
+    const QString word = part.left(end);
+    for (const char* k : {"CONSTRAINT", "PRIMARY", "UNIQUE", "CHECK", "FOREIGN"})
+        if (word.compare(QLatin1String(k), Qt::CaseInsensitive) == 0)
+            return QString();
+    return word;
+}
+
+bool collatesNoCase(const QString& part)
+{
+    static const QRegularExpression collate(QStringLiteral("\\bCOLLATE\\s+[\"'`\\[]?NOCASE\\b"),
+                                            QRegularExpression::CaseInsensitiveOption);
+    return collate.match(part).hasMatch();
+}
+
+QString quotedName(const QString& name)
+{
+    QString n = name;
+    n.replace(QLatin1Char('"'), QLatin1String("\"\""));
+    return QLatin1Char('"') + n + QLatin1Char('"');
+}
+
+// The stored tables of a file that this system makes, by name.
+bool isSystemTable(const QString& name)
+{
+    for (const auto* list : {&itemsTables(), &tempDocsTables(), &tempItemsTables()})
+        for (const TableDef& t : *list)
+            if (name.compare(QLatin1String(t.name), Qt::CaseInsensitive) == 0)
+                return true;
+    return false;
+}
+
+struct PendingTable {
+    QString name;
+    TableText stored;   // as the file holds it
+    TableText caseless; // with COLLATE NOCASE on every column of ignoresCase
+};
+
+// Replaces one table by a copy whose key columns ignore case, inside the
+// caller's transaction. Rows keep their order and row ids where a column
+// carries them; rows whose key the new table already holds go to the side table.
+DbError rebuildCaseless(Database& db, const PendingTable& t, CaselessKeysReport& report)
+{
+    const QString table = quotedName(t.name);
+    const QString building = quotedName(t.name + QStringLiteral("_caseless"));
+    DbError e;
+
+    QStringList columns, keyColumns;
+    {
+        Statement info = db.prepare(QStringLiteral("SELECT name, pk FROM pragma_table_info(?1) ORDER BY cid"), &e);
+        if (e)
+            return e;
+        info.bind(1, t.name);
+        std::vector<std::pair<int, QString>> key;
+        Statement::Step st;
+        while ((st = info.step()) == Statement::Step::Row) {
+            columns << quotedName(info.value(0).toString());
+            if (info.value(1).toInt() > 0)
+                key.emplace_back(info.value(1).toInt(), info.value(0).toString());
+        }
+        if (st == Statement::Step::Error)
+            return info.error();
+        std::sort(key.begin(), key.end());
+        for (const auto& k : key)
+            keyColumns << k.second;
+    }
+    const QString columnList = columns.join(QStringLiteral(", "));
+    bool caselessKey = false;
+    for (const QString& k : keyColumns)
+        caselessKey = caselessKey || ignoresCase(k);
+
+    // Indexes and triggers of its own go with a dropped table; they come back after.
+    QStringList dependents;
+    {
+        Statement s = db.prepare(QStringLiteral("SELECT sql FROM main.sqlite_master WHERE type IN ('index', 'trigger')"
+                                                " AND tbl_name = ?1 AND sql IS NOT NULL"),
+                                 &e);
+        if (e)
+            return e;
+        s.bind(1, t.name);
+        while (s.step() == Statement::Step::Row)
+            dependents << s.value(0).toString();
+        if (s.error())
+            return s.error();
+    }
+    // A dropped table takes its AUTOINCREMENT counter along; numbers it gave
+    // to rows since deleted must not be given again.
+    QVariant sequence;
+    if (t.stored.parts.join(QLatin1Char(' ')).contains(QLatin1String("AUTOINCREMENT"), Qt::CaseInsensitive)) {
+        Statement s = db.prepare(QStringLiteral("SELECT seq FROM main.sqlite_sequence WHERE name = ?1"), &e);
+        if (!e) {
+            s.bind(1, t.name);
+            if (s.step() == Statement::Step::Row)
+                sequence = s.value(0);
+        }
+    }
+
+    if ((e = db.exec(QStringLiteral("CREATE TABLE %1 (%2)%3")
+                         .arg(building, t.caseless.parts.join(QStringLiteral(", ")), t.caseless.tail))))
+        return e;
+    const long long before = db.scalar(QStringLiteral("SELECT count(*) FROM %1").arg(table), &e).toLongLong();
+    if (e)
+        return e;
+    // In stored order, so of keys that are now equal the first stored one stays.
+    if ((e = db.exec(QStringLiteral("INSERT %1 INTO %2 (%3) SELECT %3 FROM %4 ORDER BY rowid")
+                         .arg(caselessKey ? QStringLiteral("OR IGNORE") : QString(), building, columnList, table))))
+        return e;
+    const long long kept = db.scalar(QStringLiteral("SELECT count(*) FROM %1").arg(building), &e).toLongLong();
+    if (e)
+        return e;
+    if (kept < before) {
+        // The rows left behind are those whose exact key the new table lacks.
+        QStringList match;
+        for (const QString& k : keyColumns) {
+            const QString n = quotedName(k);
+            match << QStringLiteral("n.%1 IS o.%1").arg(n);
+            if (ignoresCase(k))
+                match << QStringLiteral("n.%1 IS o.%1 COLLATE BINARY").arg(n);
+        }
+        QStringList sideColumns;
+        for (const QString& part : t.stored.parts)
+            if (!definedColumn(part).isEmpty())
+                sideColumns << part;
+        const QString sideName = t.name + QStringLiteral("CaseDup");
+        const QString side = quotedName(sideName);
+        if ((e = db.exec(QStringLiteral("CREATE TABLE IF NOT EXISTS %1 (%2)").arg(side, sideColumns.join(QStringLiteral(", "))))))
+            return e;
+        if ((e = db.exec(QStringLiteral("INSERT INTO %1 (%2) SELECT %3 FROM %4 o WHERE NOT EXISTS"
+                                        " (SELECT 1 FROM %5 n WHERE %6) ORDER BY o.rowid")
+                             .arg(side, columnList, QStringLiteral("o.") + columns.join(QStringLiteral(", o.")), table,
+                                  building, match.join(QStringLiteral(" AND "))))))
+            return e;
+        const int moved = db.changes();
+        if (kept + moved != before)
+            return DbError::other(QStringLiteral("שדרוג הטבלה '%1' נעצר: %2 רשומות לא נמצא להן מקום")
+                                      .arg(t.name)
+                                      .arg(before - kept - moved));
+        report.setAside += moved;
+        if (!report.sideTables.contains(sideName))
+            report.sideTables << sideName;
+    }
+    if ((e = db.exec(QStringLiteral("DROP TABLE %1").arg(table))))
+        return e;
+    // The stored queries are views of this connection over the old table; the
+    // rename must not try to rewrite them, as they find the new one by name.
+    if ((e = db.exec(QStringLiteral("PRAGMA legacy_alter_table = ON"))))
+        return e;
+    e = db.exec(QStringLiteral("ALTER TABLE %1 RENAME TO %2").arg(building, table));
+    db.exec(QStringLiteral("PRAGMA legacy_alter_table = OFF"));
+    if (e)
+        return e;
+    for (const QString& sql : dependents)
+        if ((e = db.exec(sql)))
+            return e;
+    if (sequence.isValid()) {
+        Statement s = db.prepare(QStringLiteral("UPDATE main.sqlite_sequence SET seq = max(seq, ?2) WHERE name = ?1"), &e);
+        if (e)
+            return e;
+        s.bind(1, t.name);
+        s.bind(2, sequence);
+        if ((e = s.run()))
+            return e;
+        if (db.changes() == 0) {
+            Statement add = db.prepare(QStringLiteral("INSERT INTO main.sqlite_sequence (name, seq) VALUES (?1, ?2)"), &e);
+            if (e)
+                return e;
+            add.bind(1, t.name);
+            add.bind(2, sequence);
+            if ((e = add.run()))
+                return e;
+        }
+    }
+    report.rebuilt << t.name;
+    return {};
+}
 } // namespace
 
 QString declaredType(const FieldDef& f)
@@ -195,12 +430,24 @@ QString declaredType(const FieldDef& f)
     return QString();
 }
 
+bool ignoresCase(const QString& column)
+{
+    static const char* const names[]
+        = {"ItemKey", "ItemKeySon", "AccountKey", "OrigAccountKey", "AlterNum", "AlterBar", "ItemSort"};
+    for (const char* n : names)
+        if (column.compare(QLatin1String(n), Qt::CaseInsensitive) == 0)
+            return true;
+    return false;
+}
+
 QString createTableSql(const TableDef& t)
 {
     QStringList columns;
     for (size_t i = 0; i < t.fields.size(); ++i) {
         const FieldDef& f = t.fields[i];
         QString c = quoteName(f.name) + QLatin1Char(' ') + declaredType(f);
+        if (f.type == T::Text && ignoresCase(QLatin1String(f.name)))
+            c += QStringLiteral(" COLLATE NOCASE");
         if (i == 0 && t.autoIncrementFirst) {
             c += QStringLiteral(" CONSTRAINT PrimaryKey PRIMARY KEY AUTOINCREMENT");
         } else {
@@ -343,6 +590,62 @@ QString UpgradeAccountDef(const QString& itemsPath, DbError* error)
         return QString();
     db.close();
     return itemsPath;
+}
+
+DbError UpgradeCaselessKeys(const QString& path, CaselessKeysReport* report)
+{
+    CaselessKeysReport local;
+    CaselessKeysReport& r = report ? *report : local;
+    r = {};
+    if (!QFileInfo::exists(path))
+        return DbError::notFound(QStringLiteral("בסיס הנתונים אינו נמצא"));
+    Database db;
+    if (DbError e = db.open(path))
+        return e;
+
+    // Decided from the stored text alone, so a file already done costs one read.
+    std::vector<PendingTable> pending;
+    {
+        DbError e;
+        Statement s = db.prepare(QStringLiteral("SELECT name, sql FROM main.sqlite_master WHERE type = 'table' ORDER BY rowid"), &e);
+        if (e)
+            return e;
+        Statement::Step st;
+        while ((st = s.step()) == Statement::Step::Row) {
+            const QString name = s.value(0).toString();
+            if (!isSystemTable(name))
+                continue;
+            PendingTable t{name, splitTableSql(s.value(1).toString()), {}};
+            if (!t.stored.ok)
+                continue;
+            t.caseless = t.stored;
+            bool changed = false;
+            for (QString& part : t.caseless.parts) {
+                if (ignoresCase(definedColumn(part)) && !collatesNoCase(part)) {
+                    part += QStringLiteral(" COLLATE NOCASE");
+                    changed = true;
+                }
+            }
+            if (changed)
+                pending.push_back(t);
+        }
+        if (st == Statement::Step::Error)
+            return s.error();
+    }
+    if (pending.empty())
+        return {};
+
+    Transaction tx(db);
+    if (DbError e = tx.error())
+        return e;
+    CaselessKeysReport done;
+    for (const PendingTable& t : pending)
+        if (DbError e = rebuildCaseless(db, t, done))
+            return e;
+    if (DbError e = tx.commit())
+        return e;
+    r = done;
+    return {};
 }
 
 DbError InstallConfigDatabase(const QString& path)

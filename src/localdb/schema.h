@@ -3,6 +3,7 @@
 #include "localdb/database.h"
 
 #include <QString>
+#include <QStringList>
 #include <vector>
 
 namespace tagora {
@@ -33,6 +34,13 @@ struct TableDef {
 
 // The declared SQL of a field type: TEXT(25), INTEGER, SMALLINT, DOUBLE ...
 QString declaredType(const FieldDef& field);
+// Whether a text column holds a key that compares without regard to case, as
+// every text did in the files of the system this one replaces: item and
+// account keys, alternate numbers and barcodes, and the family an item range
+// is bounded by. Such columns are declared COLLATE NOCASE, so a comparison, a
+// join, an order or a key that starts from them ignores the case of Latin
+// letters (Hebrew has none). Decided by the column's name, in every file.
+bool ignoresCase(const QString& column);
 // CREATE TABLE text of a definition.
 QString createTableSql(const TableDef& table);
 
@@ -51,6 +59,23 @@ QString CreateTempItemsDB(const QString& tempItemsPath, const QString& itemsPath
 // Adds FldID, FldMaxLen and Label2Name to tAccountDef, all or nothing.
 // A missing file gives a NotFound error with "בסיס הנתונים אינו נמצא".
 QString UpgradeAccountDef(const QString& itemsPath, DbError* error);
+
+// What UpgradeCaselessKeys did to a file.
+struct CaselessKeysReport {
+    QStringList rebuilt;    // tables whose key columns now ignore case
+    int setAside = 0;       // rows moved into side tables
+    QStringList sideTables; // the side tables that received them
+};
+
+// Brings a file made before keys ignored case to the schema of new files:
+// every table of the system whose stored text lacks COLLATE NOCASE on a column
+// of ignoresCase is rebuilt (a column's collation cannot change in place),
+// all tables of the file in one transaction, rows and row ids kept. Where two
+// stored keys become one (AB'12 and ab'12), the row stored first stays and
+// the others move whole into the side table named after the table with
+// "CaseDup" appended (tItemsCaseDup), so nothing is lost. A file that is
+// already done is only read. A missing file gives a NotFound error.
+DbError UpgradeCaselessKeys(const QString& path, CaselessKeysReport* report = nullptr);
 
 // Links a table of another file into the open database under its own name.
 DbError AttachTable(Database& db, const QString& sourcePath, const QString& table);

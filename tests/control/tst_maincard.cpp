@@ -1,4 +1,5 @@
 #include "support/cardfixture.h"
+#include "support/oldlayout.h"
 
 #include "localdb/schema.h"
 #include "platform/clicklabel.h"
@@ -371,6 +372,41 @@ private slots:
         QCOMPARE(f.card->message(), QString::fromUtf8("השדרוג נכשל"));
         QCOMPARE(f.prompt->criticalCount(), 1);
         QCOMPARE(f.prompt->shown().front().title, QString::fromUtf8("תקלה"));
+    }
+
+    // An items database of an earlier version gets caseless keys when a command
+    // first needs it, and the user hears where the clashing rows went.
+    void olderItemsDatabaseUpgraded_data()
+    {
+        QTest::addColumn<QString>("button");
+        QTest::addColumn<QString>("status");
+        QTest::newRow("print by items") << "cmdPrintItmes" << QString::fromUtf8("הכנת המדבקות הסתיימה");
+        QTest::newRow("upgrade button") << "cmdUpgrade" << QString::fromUtf8("השדרוג הסתיים בהצלחה");
+        QTest::newRow("item selection") << "cmdSelectItems" << QString();
+    }
+    void olderItemsDatabaseUpgraded()
+    {
+        QFETCH(QString, button);
+        QFETCH(QString, status);
+        QTemporaryDir work;
+        const QString data = work.filePath("data");
+        QVERIFY(QDir().mkpath(data));
+        const QString items = data + "/" + dbfiles::Items;
+        QVERIFY(!makeOldItemsDb(items, "INSERT INTO tItems (ItemKey, Copies, PrintLabel) VALUES ('ab''12', 2, 1), ('AB''12', 5, 1)"));
+        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n")
+                          .arg(work.filePath("journal.txt"), data)
+                          .toUtf8());
+        f.c<QPushButton>(button)->click();
+        const QStringList shown = f.prompt->lines();
+        QCOMPARE(shown.size(), 1);
+        QVERIFY2(shown.first().startsWith(QString::fromUtf8("שימו לב: ")) && shown.first().contains("tItemsCaseDup"),
+                 qPrintable(shown.first()));
+        if (!status.isEmpty())
+            QCOMPARE(f.card->message(), status);
+        Database db;
+        QVERIFY(!db.open(items));
+        QCOMPARE(db.scalar("SELECT group_concat(ItemKey || '=' || Copies) FROM tItems").toString(), QString("ab'12=2"));
+        QCOMPARE(db.scalar("SELECT group_concat(ItemKey || '=' || Copies) FROM tItemsCaseDup").toString(), QString("AB'12=5"));
     }
 
     // Labels by items make the documents database (and a new data folder) ready; by documents do not.

@@ -77,6 +77,7 @@ private slots:
         QTest::addColumn<QString>("current");
         QTest::addColumn<QString>("ticked");
         QTest::newRow("exact key ticks it") << "A1" << "A1" << "A1";
+        QTest::newRow("key typed in another case ticks it") << "a1" << "A1" << "A1";
         QTest::newRow("start of a key ticks nothing") << "A" << "A0" << "";
         QTest::newRow("apostrophe in the key") << "O'R" << "O'R" << "O'R";
         QTest::newRow("no such key lists from there") << "Z" << "" << "";

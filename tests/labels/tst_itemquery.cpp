@@ -61,6 +61,7 @@ private slots:
         QTest::newRow("no account") << false << "O'Brien" << "NoKey|NoCode|NoName|A1|5|7290000000015|5";
         QTest::newRow("ticked but empty") << true << "" << "NoKey|NoCode|NoName|A1|5|7290000000015|5";
         QTest::newRow("account with apostrophe") << true << "O'Brien" << "O'Brien|O'Brien|O'Brien|OB-A1|4.5|OBBAR1|4.75";
+        QTest::newRow("account typed in another case") << true << "o'brien" << "o'brien|o'brien|o'brien|OB-A1|4.5|OBBAR1|4.75";
         QTest::newRow("account without data") << true << "Nobody" << "Nobody|Nobody|Nobody|<null>|<null>|<null>|<null>";
     }
     void accountColumns()
@@ -108,6 +109,7 @@ private slots:
         QTest::newRow("descending") << 2 << "" << "B1 A2 A1";
         QTest::newRow("open-ended from") << 1 << ItemRangeCriteria("A2", "", "", "") << "A2 B1";
         QTest::newRow("family range") << 1 << ItemRangeCriteria("", "", "20", "20") << "B1";
+        QTest::newRow("bounds in another case") << 1 << ItemRangeCriteria("a2", "b1", "", "") << "A2 B1";
         QTest::newRow("bound with apostrophe") << 1 << ItemRangeCriteria("", "A1'", "", "") << "A1";
     }
     void orderAndRange()

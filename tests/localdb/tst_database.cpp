@@ -202,24 +202,104 @@ private slots:
         QVERIFY(db.links().empty());
     }
 
-    // A copied or moved data folder keeps its links working.
-    void movedFolderFindsSiblingSource()
+    // A link reads the file of its name beside the linking file, so a data
+    // folder moved or copied elsewhere reads its own files; the recorded path
+    // serves only when nothing of that name is beside it.
+    void linkPrefersItsOwnFolder_data()
     {
-        QTemporaryDir a;
+        QTest::addColumn<bool>("copyItems");
+        QTest::addColumn<bool>("moveItems");
+        QTest::addColumn<QString>("read");
+        QTest::newRow("folder moved") << false << true << "original";
+        QTest::newRow("folder copied") << true << false << "copy";
+        QTest::newRow("linking file alone copied") << false << false << "original";
+    }
+    void linkPrefersItsOwnFolder()
+    {
+        QFETCH(bool, copyItems);
+        QFETCH(bool, moveItems);
+        QFETCH(QString, read);
+        QTemporaryDir a, b;
         {
             Database s;
             QVERIFY(!s.open(a.filePath("items.db"), Database::OpenMode::Create));
-            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('moved')"));
+            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('original')"));
             Database db;
             QVERIFY(!db.open(a.filePath("docs.db"), Database::OpenMode::Create));
             QVERIFY(!db.attachTable(a.filePath("items.db"), "tItems"));
         }
-        QTemporaryDir b;
-        QVERIFY(QFile::rename(a.filePath("items.db"), b.filePath("items.db")));
-        QVERIFY(QFile::rename(a.filePath("docs.db"), b.filePath("docs.db")));
+        QVERIFY(QFile::copy(a.filePath("docs.db"), b.filePath("docs.db")));
+        if (moveItems)
+            QVERIFY(QFile::rename(a.filePath("items.db"), b.filePath("items.db")));
+        if (copyItems) {
+            QVERIFY(QFile::copy(a.filePath("items.db"), b.filePath("items.db")));
+            Database copy;
+            QVERIFY(!copy.open(b.filePath("items.db")));
+            QVERIFY(!copy.exec("UPDATE tItems SET ItemKey = 'copy'"));
+        }
         Database db;
         QVERIFY(!db.open(b.filePath("docs.db")));
-        QCOMPARE(db.scalar("SELECT ItemKey FROM tItems").toString(), QString("moved"));
+        QCOMPARE(db.scalar("SELECT ItemKey FROM tItems").toString(), read);
+    }
+
+    // A linked file that cannot serve: the file still opens, and what uses the
+    // table is told which file is wrong and how, directly or through a query.
+    void brokenLinkNamesItsFile_data()
+    {
+        QTest::addColumn<QByteArray>("content"); // of items.db; empty: no such file
+        QTest::addColumn<bool>("notFound");
+        QTest::addColumn<QString>("says");
+        QTest::newRow("missing") << QByteArray() << true << QString::fromUtf8("אינו נמצא");
+        QTest::newRow("not a database") << QByteArray(4096, 'x') << false
+                                        << QString::fromUtf8("אינו קובץ בסיס נתונים או שהוא פגום");
+        QTest::newRow("damaged") << QByteArray("damaged") << false
+                                 << QString::fromUtf8("אינו קובץ בסיס נתונים או שהוא פגום");
+        QTest::newRow("without the table") << QByteArray("other table") << true << QString::fromUtf8("אין טבלה");
+    }
+    void brokenLinkNamesItsFile()
+    {
+        QFETCH(QByteArray, content);
+        QFETCH(bool, notFound);
+        QFETCH(QString, says);
+        QTemporaryDir d;
+        const QString items = d.filePath("items.db");
+        {
+            Database s;
+            QVERIFY(!s.open(items, Database::OpenMode::Create));
+            QVERIFY(!s.exec("CREATE TABLE tItems (ItemKey TEXT); INSERT INTO tItems VALUES ('A')"));
+            Database db;
+            QVERIFY(!db.open(d.filePath("docs.db"), Database::OpenMode::Create));
+            QVERIFY(!db.attachTable(items, "tItems"));
+            QVERIFY(!db.createQuery("qKeys", "SELECT ItemKey FROM tItems"));
+        }
+        if (content == "damaged") {
+            // A sound header over a schema page that is not one.
+            QFile f(items);
+            QVERIFY(f.open(QIODevice::ReadWrite));
+            QVERIFY(f.seek(100));
+            f.write(QByteArray(int(f.size()) - 100, '\xff'));
+        } else if (content == "other table") {
+            Database s;
+            QVERIFY(!s.open(items));
+            QVERIFY(!s.exec("DROP TABLE tItems; CREATE TABLE tOther (a)"));
+        } else {
+            QVERIFY(QFile::remove(items));
+            if (!content.isEmpty()) {
+                QFile f(items);
+                QVERIFY(f.open(QIODevice::WriteOnly));
+                f.write(content);
+            }
+        }
+        Database db;
+        QVERIFY(!db.open(d.filePath("docs.db")));
+        for (const char* sql : {"SELECT ItemKey FROM tItems", "SELECT * FROM qKeys"}) {
+            DbError e;
+            db.scalar(sql, &e);
+            QVERIFY(e.isError());
+            QVERIFY2(e.message.contains(QDir::toNativeSeparators(items)), qPrintable(e.message));
+            QVERIFY2(e.message.contains(says), qPrintable(e.message));
+            QCOMPARE(e.kind == DbError::Kind::NotFound, notFound);
+        }
     }
 };
 

@@ -1,3 +1,5 @@
+#include "support/oldlayout.h"
+
 #include "localdb/database.h"
 #include "localdb/schema.h"
 
@@ -134,44 +136,6 @@ private slots:
         }
     }
 
-    void keysAndLayout_data()
-    {
-        QTest::addColumn<QString>("file");
-        QTest::addColumn<QString>("table");
-        QTest::addColumn<QStringList>("key");
-        QTest::addColumn<QString>("first");
-        QTest::addColumn<QString>("last");
-        QTest::addColumn<int>("count");
-        QTest::newRow("lines") << dbfiles::TempDocs << "tTempDocLines" << QStringList{"WizFileID", "HeadNumber", "LineNum"}
-                               << "WizFileID" << "Details" << 21;
-        QTest::newRow("headers") << dbfiles::TempDocs << "tTempDocHeaders" << QStringList{"WizFileID", "Number"}
-                                 << "WizFileID" << "OrigAccountKey" << 25;
-        QTest::newRow("label data") << dbfiles::TempDocs << "tPLabData" << QStringList{"KLine"} << "KLine" << "Par20" << 24;
-        QTest::newRow("items") << dbfiles::Items << "tItems" << QStringList{"ItemKey"} << "ItemKey" << "IgnoreInDoc" << 22;
-        QTest::newRow("price list") << dbfiles::Items << "tPriceList" << QStringList{"ItemKey", "PriceList"} << "ItemKey"
-                                    << "Currency" << 4;
-        QTest::newRow("staging items") << dbfiles::TempItems << "tTempItems" << QStringList{"ItemKey"} << "ItemKey"
-                                       << "IgnoreInDoc" << 22;
-    }
-    void keysAndLayout()
-    {
-        QFETCH(QString, file);
-        QFETCH(QString, table);
-        QFETCH(QStringList, key);
-        QFETCH(QString, first);
-        QFETCH(QString, last);
-        QFETCH(int, count);
-        Database db;
-        QVERIFY(!db.open(path(file)));
-        const QStringList cols = columnsOf(db, table);
-        QCOMPARE(cols.size(), count);
-        QCOMPARE(cols.first(), first);
-        QCOMPARE(cols.last(), last);
-        QCOMPARE(columnsOf(db, table, true), key);
-        const QString sql = db.scalar(QStringLiteral("SELECT sql FROM sqlite_master WHERE name='%1'").arg(table)).toString();
-        QVERIFY(sql.contains("CONSTRAINT PrimaryKey PRIMARY KEY"));
-    }
-
     void accountDefCountsItsOwnIds()
     {
         Database db;
@@ -194,6 +158,11 @@ private slots:
             << "INSERT INTO tAlterKeys VALUES ('C1', 'I1', 'old', 'BAR-7')"
             << "INSERT INTO tTempAlterKeys VALUES ('C1', 'I1', 'new', 'ignored')" << "qAddUpdateAlterKeys"
             << "SELECT AlterNum || '/' || AlterBar FROM tAlterKeys WHERE AccountKey='C1'" << "new/BAR-7";
+        QTest::newRow("staged key in another case updates the stored row")
+            << "INSERT INTO tAlterKeys VALUES ('AB''12', 'EL-1019', 'old', 'BAR-7')"
+            << "INSERT INTO tTempAlterKeys VALUES ('ab''12', 'el-1019', 'new', NULL)" << "qAddUpdateAlterKeys"
+            << "SELECT group_concat(AccountKey || '/' || ItemKey || '=' || AlterNum || '/' || AlterBar) FROM tAlterKeys"
+            << "AB'12/EL-1019=new/BAR-7";
         QTest::newRow("new alternate has no barcode")
             << "" << "INSERT INTO tTempAlterKeys VALUES ('C''2', 'I1', 'n2', 'B2')" << "qAddUpdateAlterKeys"
             << "SELECT AlterNum || '/' || coalesce(AlterBar, 'none') FROM tAlterKeys WHERE AccountKey='C''2'" << "n2/none";
@@ -235,6 +204,140 @@ private slots:
         // Running it again changes nothing more.
         QVERIFY(!db.runQuery(query));
         QCOMPARE(db.scalar(check).toString(), expected);
+    }
+
+    // Keys that differ only in case are one key, in every file made now.
+    void keysIgnoreCase_data()
+    {
+        QTest::addColumn<QString>("file");
+        QTest::addColumn<QString>("first");
+        QTest::addColumn<QString>("second");
+        QTest::newRow("items") << dbfiles::Items << "INSERT INTO tItems (ItemKey) VALUES ('AB''12')"
+                               << "INSERT INTO tItems (ItemKey) VALUES ('ab''12')";
+        QTest::newRow("alternate keys") << dbfiles::Items << "INSERT INTO tAlterKeys (AccountKey, ItemKey) VALUES ('C1', 'EL-1')"
+                                        << "INSERT INTO tAlterKeys (AccountKey, ItemKey) VALUES ('c1', 'el-1')";
+        QTest::newRow("staged price lists") << dbfiles::TempItems
+                                            << "INSERT INTO tTempPriceList (ItemKey, PriceList) VALUES ('EL-1', 2)"
+                                            << "INSERT INTO tTempPriceList (ItemKey, PriceList) VALUES ('el-1', 2)";
+    }
+    void keysIgnoreCase()
+    {
+        QFETCH(QString, file);
+        QFETCH(QString, first);
+        QFETCH(QString, second);
+        const QString target = path("case-" + file);
+        DbError e;
+        if (file == dbfiles::TempItems)
+            CreateTempItemsDB(target, path(dbfiles::Items), &e);
+        else
+            CreateItemsDB(target, &e);
+        QVERIFY2(!e, qPrintable(e.message));
+        Database db;
+        QVERIFY(!db.open(target));
+        QVERIFY(!db.exec(first));
+        QVERIFY(db.exec(second).isDuplicateKey());
+    }
+
+    // A file of an earlier version gets caseless keys without losing a row:
+    // of keys that become one, the first stored stays and the others move
+    // whole into the table's side table.
+    void upgradeOlderFile_data()
+    {
+        QTest::addColumn<QString>("rows");
+        QTest::addColumn<QString>("table");
+        QTest::addColumn<QString>("columns");
+        QTest::addColumn<QStringList>("kept");
+        QTest::addColumn<QStringList>("setAside");
+        QTest::newRow("items")
+            << "INSERT INTO tItems (ItemKey, ItemName, PrintLabel) VALUES ('ab''12', 'first', 1), ('X1', 'other', 0),"
+               " ('AB''12', 'second', 1)"
+            << "tItems" << "ItemKey, ItemName, PrintLabel" << QStringList{"ab'12|first|1", "X1|other|0"}
+            << QStringList{"AB'12|second|1"};
+        QTest::newRow("alternate keys by account and item")
+            << "INSERT INTO tAlterKeys VALUES ('C1', 'I1', 'n1', 'b1'), ('c1', 'i1', 'n2', 'b2'), ('c1', 'I2', 'n3', NULL)"
+            << "tAlterKeys" << "AccountKey, ItemKey, AlterNum, AlterBar" << QStringList{"C1|I1|n1|b1", "c1|I2|n3|<null>"}
+            << QStringList{"c1|i1|n2|b2"};
+        QTest::newRow("price lists: another list is another key")
+            << "INSERT INTO tPriceList VALUES ('i1', 1, 10, 'ILS'), ('I1', 2, 20, 'ILS'), ('I1', 1, 11, 'USD')"
+            << "tPriceList" << "ItemKey, PriceList, Price" << QStringList{"i1|1|10", "I1|2|20"} << QStringList{"I1|1|11"};
+        QTest::newRow("account definitions keep every row")
+            << "INSERT INTO tAccountDef (AccountKey, LabelName) VALUES ('C1', 'a.lbl'), ('c1', 'b.lbl')" << "tAccountDef"
+            << "DefID, AccountKey, LabelName" << QStringList{"1|C1|a.lbl", "2|c1|b.lbl"} << QStringList{};
+    }
+    void upgradeOlderFile()
+    {
+        QFETCH(QString, rows);
+        QFETCH(QString, table);
+        QFETCH(QString, columns);
+        QFETCH(QStringList, kept);
+        QFETCH(QStringList, setAside);
+        const QString items = path("older.tdb");
+        DbError e = makeOldItemsDb(items, rows);
+        QVERIFY2(!e, qPrintable(e.message));
+        auto read = [&](const QString& from) {
+            QStringList out;
+            Database db;
+            db.open(items);
+            Statement s = db.prepare(QStringLiteral("SELECT %1 FROM %2 ORDER BY rowid").arg(columns, from));
+            while (s.step() == Statement::Step::Row) {
+                QStringList cells;
+                for (int i = 0; i < s.columnCount(); ++i)
+                    cells << (s.isNull(i) ? QStringLiteral("<null>") : s.value(i).toString());
+                out << cells.join('|');
+            }
+            return out;
+        };
+        CaselessKeysReport report;
+        QVERIFY2(!(e = UpgradeCaselessKeys(items, &report)), qPrintable(e.message));
+        QCOMPARE(report.rebuilt, QStringList({"tItems", "tAlterKeys", "tAlterPrices", "tAccountDef", "tPriceList"}));
+        QCOMPARE(report.setAside, int(setAside.size()));
+        QCOMPARE(report.sideTables, setAside.isEmpty() ? QStringList() : QStringList{table + "CaseDup"});
+        QCOMPARE(read(table), kept);
+        QCOMPARE(read(table + "CaseDup"), setAside);
+
+        Database db;
+        QVERIFY(!db.open(items));
+        // The table now holds keys the way a new file does, and the stored query still reads it.
+        QCOMPARE(db.scalar("SELECT count(*) FROM tItems WHERE ItemKey = 'x1'").toInt(), rows.contains("'X1'") ? 1 : 0);
+        QVERIFY(db.exec("INSERT INTO tAlterKeys (AccountKey, ItemKey) VALUES ('K', 'I'), ('k', 'i')").isDuplicateKey());
+        QVERIFY(db.prepare("SELECT * FROM qSelectItems").isValid());
+        QCOMPARE(columnsOf(db, "tAccountDef").size(), 8);
+        db.close();
+
+        // Done once: a second run finds nothing to do and changes nothing.
+        QVERIFY(!UpgradeCaselessKeys(items, &report));
+        QCOMPARE(report.rebuilt, QStringList());
+        QCOMPARE(read(table), kept);
+    }
+
+    // Numbers given to definitions since deleted are not given again after the rebuild.
+    void upgradeKeepsDefinitionNumbers()
+    {
+        const QString items = path("older-defs.tdb");
+        QVERIFY(!makeOldItemsDb(items, "INSERT INTO tAccountDef (AccountKey) VALUES ('C1'), ('C2'), ('C3');"
+                                       "DELETE FROM tAccountDef WHERE AccountKey = 'C3'"));
+        QVERIFY(!UpgradeCaselessKeys(items));
+        Database db;
+        QVERIFY(!db.open(items));
+        QVERIFY(!db.exec("INSERT INTO tAccountDef (AccountKey) VALUES ('C4')"));
+        QCOMPARE(db.scalar("SELECT DefID FROM tAccountDef WHERE AccountKey = 'C4'").toInt(), 4);
+    }
+
+    // An older documents database, its links open, gets caseless keys too.
+    void upgradeOlderDocumentsFile()
+    {
+        DbError e;
+        const QString made = CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), path("made-docs.tmp"), &e);
+        QVERIFY(!made.isEmpty());
+        const QString docs = path("older-docs.tmp");
+        QVERIFY(!oldLayoutOf(made, docs, "INSERT INTO tTempDocHeaders (WizFileID, Number, AccountKey) VALUES (2, 7, 'c1')"));
+        CaselessKeysReport report;
+        QVERIFY2(!(e = UpgradeCaselessKeys(docs, &report)), qPrintable(e.message));
+        QCOMPARE(report.rebuilt, QStringList({"tTempDocHeaders", "tTempDocLines"}));
+        Database db;
+        QVERIFY(!db.open(docs));
+        QCOMPARE(db.scalar("SELECT Number FROM tTempDocHeaders WHERE AccountKey = 'C1'").toInt(), 7);
+        QVERIFY(db.prepare("SELECT * FROM qSelectDocLines").isValid());
     }
 
     void missingLinkSourceStopsAtThatLink()
