@@ -232,6 +232,41 @@ private slots:
         QVERIFY(o.journal.at(o.journal.size() - 2).endsWith("LabelPrint()"));
     }
 
+    // Opening another file drops what FastLabel collected: each file's records
+    // are printed before the next file opens, with or without header labels.
+    void fastLabelPrintsBeforeEachFile_data()
+    {
+        QTest::addColumn<bool>("header");
+        QTest::addColumn<QStringList>("events");
+        QTest::newRow("record labels") << false << QStringList{
+            "open /l/own.lbl", "qty 4", "print", "open /l/long.lbl", "qty 1", "print", "open /l/a.lbl", "qty 2", "print"};
+        QTest::newRow("with header labels") << true << QStringList{
+            "open /l/head.lbl", "qty 1", "print", "open /l/own.lbl", "qty 4", "print", "open /l/long.lbl", "qty 1",
+            "print", "open /l/head.lbl", "qty 1", "print", "open /l/a.lbl", "qty 2", "print"};
+    }
+    void fastLabelPrintsBeforeEachFile()
+    {
+        QFETCH(bool, header);
+        QFETCH(QStringList, events);
+        LabelData data("UPDATE tAccountDef SET LabelName = '/l/own.lbl', FldID = 2, FldMaxLen = 13,"
+                       " Label2Name = '/l/long.lbl'");
+        LabelRunRequest r = request(data, 7, 2, {});
+        r.printHeader = header;
+        r.headerLabel = "/l/head.lbl";
+        const Outcome o = run(r);
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
+        QStringList seen;
+        for (const QString& l : o.journal) {
+            if (l.contains(".LabelOpen("))
+                seen << "open " + l.section('"', 1, 1);
+            else if (l.contains(".LabelQty = "))
+                seen << "qty " + l.section(" = ", 1);
+            else if (l.endsWith(".LabelPrint()"))
+                seen << "print";
+        }
+        QCOMPARE(seen, events);
+    }
+
     void nullSentAsEmptyText()
     {
         LabelData data;
