@@ -367,6 +367,25 @@ private slots:
             sent << l.section('"', 3, 3);
         QCOMPARE(sent, keys);
     }
+
+    // A ticked expression row left blank is neither asked of the query nor sent.
+    void blankExpressionRowIsNotSent()
+    {
+        LabelData data;
+        const QString journal = work.filePath(QStringLiteral("blank%1.txt").arg(++runs));
+        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n").arg(journal, data.folder).toUtf8());
+        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
+        f.c<QCheckBox>("ChkFldSend(33)")->setChecked(true);
+        f.c<QLineEdit>("txtFldExpr(33)")->setText(" ");
+        f.c<QCheckBox>("ChkFldSend(34)")->setChecked(true);
+        f.c<QLineEdit>("txtFldExpr(34)")->setText("tItems.Unit");
+        f.c<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
+        QCOMPARE(f.card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        const QStringList lines = readJournal(journal);
+        QVERIFY(lines.filter("\"EX1\"").isEmpty());
+        QCOMPARE(lines.filter("\"EX2\", \"pc\"").size(), 3);
+    }
 };
 
 QTEST_MAIN(TestLabelRun)
