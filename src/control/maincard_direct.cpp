@@ -93,7 +93,8 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
         }
     }
     const QString page = QDir(folder).filePath(QStringLiteral("tgrlab1.htm"));
-    error = CreateLabPage(page, dbPath, sql, layout, ui->txtPriceFormat->text(), this);
+    long long labels = 0;
+    error = CreateLabPage(page, dbPath, sql, layout, ui->txtPriceFormat->text(), this, &labels);
     if (!error.isEmpty())
         return fail(error);
     if (!m_services.pages->showPage(page, &error))
@@ -101,17 +102,9 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
 
     // A value the barcode cannot carry gets no picture rather than a wrong
     // one; the user learns which labels lack theirs.
-    if (!refused.isEmpty()) {
-        QStringList lines;
-        for (const BarcodeRefusal& r : refused.mid(0, 10))
-            lines << QStringLiteral("רשומה %1: '%2' - %3").arg(r.record).arg(r.data, r.reason);
-        if (refused.size() > 10)
-            lines << QStringLiteral("ועוד %1").arg(refused.size() - 10);
-        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention,
-                                   QStringLiteral("%1 מדבקות הודפסו ללא ברקוד, כי לא ניתן לקודד את הערך בסוג הברקוד שנבחר:\n")
-                                           .arg(refused.size())
-                                       + lines.join(QLatin1Char('\n')));
-    }
+    const QString lacking = BarcodeRefusalMessage(refused, labels);
+    if (!lacking.isEmpty())
+        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention, lacking);
 }
 
 } // namespace tagora

@@ -9,6 +9,7 @@
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QSet>
 #include <QStringEncoder>
 
 namespace tagora {
@@ -170,6 +171,7 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
     const int col = records.columnIndex(column);
     if (col < 0)
         return QStringLiteral("העמודה %1 אינה ברשומת המדבקה").arg(column);
+    const int copiesColumn = records.columnIndex(QStringLiteral("Copies"));
     const int code = libraryBarType(bar.BarType, bar);
     const int handle = library.A1OpenInstance();
     int record = 0;
@@ -189,12 +191,56 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
         if (!DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
                          &reason)
             && refusals)
-            refusals->push_back({record, data, reason});
+            refusals->push_back({record, copiesOf(copiesColumn >= 0 ? records.value(copiesColumn) : QVariant()), data,
+                                 reason});
     }
     if (step == Statement::Step::Error)
         failure = records.error().message;
     library.A1CloseInstance(handle);
     return failure;
+}
+
+QString BarcodeRefusalMessage(const QVector<BarcodeRefusal>& refused, long long labelsOnPage)
+{
+    // A record with no copies is not on the page; one refused on two lines
+    // still lacks its barcode on the same labels.
+    QVector<BarcodeRefusal> shown;
+    QSet<int> records;
+    long long lacking = 0;
+    for (const BarcodeRefusal& r : refused) {
+        if (r.labels <= 0)
+            continue;
+        shown.push_back(r);
+        if (!records.contains(r.record)) {
+            records.insert(r.record);
+            lacking += r.labels;
+        }
+    }
+    if (shown.isEmpty())
+        return QString();
+    std::stable_sort(shown.begin(), shown.end(),
+                     [](const BarcodeRefusal& a, const BarcodeRefusal& b) { return a.record < b.record; });
+    const long long total = qMax(labelsOnPage, lacking);
+    const QString one = QStringLiteral(" תודפס בלי ברקוד, כי לא ניתן לקודד את הערך שלה בסוג הברקוד שנבחר:");
+    const QString many = QStringLiteral(" יודפסו בלי ברקוד, כי לא ניתן לקודד את הערך שלהן בסוג הברקוד שנבחר:");
+    QString head;
+    if (total == 1)
+        head = QStringLiteral("המדבקה שבדף") + one;
+    else if (lacking == total)
+        head = QStringLiteral("כל %1 המדבקות שבדף").arg(total) + many;
+    else if (lacking == 1)
+        head = QStringLiteral("מדבקה אחת מתוך %1 המדבקות שבדף").arg(total) + one;
+    else
+        head = QStringLiteral("%1 מתוך %2 המדבקות שבדף").arg(lacking).arg(total) + many;
+    QStringList lines{head};
+    constexpr int kListed = 10;
+    for (const BarcodeRefusal& r : shown.mid(0, kListed)) {
+        const QString count = r.labels == 1 ? QStringLiteral("מדבקה אחת") : QStringLiteral("%1 מדבקות").arg(r.labels);
+        lines << QStringLiteral("רשומה %1 (%2): %3").arg(r.record).arg(count, r.reason);
+    }
+    if (shown.size() > kListed)
+        lines << QStringLiteral("ועוד %1 ברקודים שלא נוצרו").arg(shown.size() - kListed);
+    return lines.join(QLatin1Char('\n'));
 }
 
 QStringList WriteLabelStyles(const DirectLabelLayout& layout)
@@ -249,8 +295,11 @@ QString LetterTable(const QVariant& value, const QString& className)
 }
 
 QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
-                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress)
+                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress,
+                      long long* labels)
 {
+    if (labels)
+        *labels = 0;
     const LabelPageDef& page = layout.page;
     if (page.PageRows <= 0 || page.PageCols <= 0)
         return QStringLiteral("מבנה דף המדבקות אינו תקין: %1 שורות, %2 מדבקות בשורה").arg(page.PageRows).arg(page.PageCols);
@@ -302,6 +351,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     // No records: the page ends after its body tag.
     if (!anyRecord)
         return out.close() ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+    if (labels)
+        *labels = total;
     const long long perPage = (long long)page.PageRows * page.PageCols;
     const long long pages = (total + perPage - 1) / perPage;
 

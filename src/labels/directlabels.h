@@ -21,9 +21,15 @@ QString PrepareJobFolder(const QString& folder);
 // A record whose barcode the symbology cannot encode: it gets no picture.
 struct BarcodeRefusal {
     int record = 0;
+    int labels = 0;     // the record's labels on the page (its copies)
     QString data;
-    QString reason;
+    QString reason;     // the barcode type, the value and why, in Hebrew
 };
+
+// The attention message after a job whose page has labels without their
+// barcode: how many of the page's labels lack one, and why, record by
+// record. Empty when no label on the page lacks one.
+QString BarcodeRefusalMessage(const QVector<BarcodeRefusal>& refused, long long labelsOnPage);
 
 // The pictures of one barcode line, one per record with a text value, named
 // by field index and record number. Empty text on success; refusals of the
@@ -44,8 +50,10 @@ QString LetterTable(const QVariant& value, const QString& className);
 // (characters it lacks as numeric references), CRLF, a grid of labels per
 // printed page. The layout's lines must carry their FieldName and IsPrice.
 // Empty text on success.
+// labels, when given, receives the number of labels on the page.
 QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
-                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress);
+                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress,
+                      long long* labels = nullptr);
 
 // The cell size attribute value for n rows or columns: 100 / n with one decimal, at least two digits.
 QString cellPercent(int count);

@@ -26,6 +26,9 @@ QString readPage(const QString& path)
     return QStringDecoder("windows-1255").decode(f.readAll());
 }
 
+// Refused barcodes for the message: record number and labels on the page.
+using Refused = QList<QPair<int, int>>;
+
 LabelLineDef textLine(short field, const QString& column, const QString& prefix = {}, bool price = false)
 {
     LabelLineDef l;
@@ -245,9 +248,43 @@ private slots:
         QVERIFY(!QFile::exists(folder + "/B0400003.BMP")); // no barcode at all
         QCOMPARE(refused.size(), 1);
         QCOMPARE(refused.first().record, 2);
+        QCOMPARE(refused.first().labels, 1); // A2's copies
         // The folder is emptied for the next job.
         QVERIFY(PrepareJobFolder(folder).isEmpty());
         QVERIFY(QDir(folder).entryList(QDir::Files).isEmpty());
+    }
+
+    // The attention message counts labels on the page, not records: a record
+    // with copies is several labels, one refused on two lines is still its
+    // labels once, and one with no copies is not on the page.
+    void refusalMessage_data()
+    {
+        QTest::addColumn<Refused>("refused");
+        QTest::addColumn<int>("onPage");
+        QTest::addColumn<QString>("head");
+        QTest::addColumn<int>("listed");
+        using R = Refused;
+        QTest::newRow("copies count") << R{{2, 3}, {5, 1}} << 9 << "4 מתוך 9 המדבקות שבדף יודפסו בלי ברקוד" << 2;
+        QTest::newRow("two lines, one record") << R{{2, 3}, {2, 3}} << 9 << "3 מתוך 9 המדבקות" << 2;
+        QTest::newRow("not on the page") << R{{3, 0}} << 9 << "" << 0;
+    }
+    void refusalMessage()
+    {
+        QFETCH(Refused, refused);
+        QFETCH(int, onPage);
+        QFETCH(QString, head);
+        QFETCH(int, listed);
+        QVector<BarcodeRefusal> list;
+        for (const auto& [record, labels] : refused)
+            list.push_back({record, labels, "12", QStringLiteral("ברקוד EAN-13 לערך \"12\": אורך שגוי")});
+        const QString message = BarcodeRefusalMessage(list, onPage);
+        if (head.isEmpty()) {
+            QVERIFY(message.isEmpty());
+            return;
+        }
+        const QStringList lines = message.split('\n');
+        QVERIFY2(lines.first().startsWith(head), qPrintable(lines.first()));
+        QCOMPARE(lines.size() - 1, listed);
     }
 
     void layoutInSettings()
@@ -305,6 +342,29 @@ private slots:
         QCOMPARE(f.prompt->criticalCount(), 1);
         directLabelLayout() = DirectLabelLayout{};
         qunsetenv("Temp");
+    }
+
+    // A job with a value its barcode cannot carry: the page opens, then the
+    // message counts that record's labels against the page's, in Hebrew.
+    void printButtonReportsRefusals()
+    {
+        LabelData data("UPDATE tItems SET BarCode = '729000000001X', Copies = 4 WHERE ItemKey = 'A2'");
+        const QString temp = work.filePath("temp-refused");
+        qputenv("Temp", temp.toUtf8());
+        CardFixture f(QStringLiteral("[GeneralParams]\nDBPath=%1\nOptOLE3=True\nOptOLE0=False\n"
+                                     "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n"
+                                     "[LabelBar]\nBarType=6\n").arg(data.folder).toUtf8());
+        f.card->control<QPushButton>("cmdPrintItmes")->click();
+        qunsetenv("Temp");
+        directLabelLayout() = DirectLabelLayout{};
+        QCOMPARE(f.pages->shown.size(), 1);
+        QCOMPARE(f.prompt->criticalCount(), 0);
+        QCOMPARE(f.prompt->lines().size(), 1);
+        const QString shown = f.prompt->lines().first();
+        // A1 2, A2 4 and B1 3 copies: nine labels, A2's four without their barcode.
+        QVERIFY2(shown.startsWith(QString::fromUtf8("שימו לב: 4 מתוך 9 המדבקות שבדף")), qPrintable(shown));
+        QVERIFY2(shown.contains("729000000001X") && shown.contains("EAN-13"), qPrintable(shown));
+        QVERIFY2(!shown.contains(QRegularExpression("Error|Invalid|digits")), qPrintable(shown));
     }
 };
 
