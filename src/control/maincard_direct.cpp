@@ -57,14 +57,17 @@ bool MainCard::prepareDirectFields(QString* error)
     return true;
 }
 
-void MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
+// A host learns from the result whether the page is there; the user sees why not.
+bool MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
 {
     QString error;
     if (prepareDirectFields(&error))
         error = CreateLabPage(pFileName, pDBName, BuildItemQuery(pQueryType, pOrderBy).toString(), directLabelLayout(),
                               ui->txtPriceFormat->text(), this);
-    if (!error.isEmpty())
-        m_services.prompt->critical(titles::Fault, error);
+    if (error.isEmpty())
+        return true;
+    m_services.prompt->critical(titles::Fault, error);
+    return false;
 }
 
 void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)

@@ -9,6 +9,7 @@
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QSaveFile>
 #include <QSet>
 #include <QStringEncoder>
 
@@ -32,6 +33,9 @@ QString escaped(const QString& text)
 
 // The page's lines, in the code page it declares, each with CRLF. A character
 // the code page lacks goes as a numeric reference rather than a question mark.
+// The page is written aside and takes its name only when whole: a failure
+// leaves neither a cut page nor a stray file, and an earlier page at that
+// name stays until a whole one replaces it.
 class PageWriter {
 public:
     explicit PageWriter(const QString& path)
@@ -39,8 +43,7 @@ public:
     {
     }
 
-    bool open() { return m_file.open(QIODevice::WriteOnly | QIODevice::Truncate); }
-    QString error() const { return m_file.errorString(); }
+    bool open() { return m_file.open(QIODevice::WriteOnly); }
 
     void line(const QString& text) { write(text + QStringLiteral("\r\n")); }
 
@@ -66,14 +69,19 @@ public:
             m_failed = true;
     }
 
-    bool close()
+    // Puts the page in place; false, with the page left out, when any write failed.
+    bool commit()
     {
-        m_file.close();
-        return !m_failed && m_file.error() == QFileDevice::NoError;
+        if (m_failed) {
+            m_file.cancelWriting();
+            m_file.commit();
+            return false;
+        }
+        return m_file.commit();
     }
 
 private:
-    QFile m_file;
+    QSaveFile m_file;
     QStringEncoder m_encoder{"windows-1255"};
     bool m_failed = false;
 };
@@ -308,10 +316,10 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     const QString picture = pictureAttributes(layout.bar);
     const QString format = priceFormat.trimmed().isEmpty() ? QStringLiteral("0.00") : priceFormat.trimmed();
 
-    QFile::remove(fileName);
+    const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
     PageWriter out(fileName);
     if (!out.open())
-        return out.error();
+        return QStringLiteral("לא ניתן ליצור את הקובץ '%1'").arg(QDir::toNativeSeparators(fileName));
     out.line(QStringLiteral("<HTML>"));
     out.line(QStringLiteral("<HEAD>"));
     out.line(QStringLiteral("<TITLE>מדבקות פריטים</TITLE>"));
@@ -344,23 +352,20 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
         if (!e && copies < 0 && first.columnCount() > 0)
             e = DbError::other(QStringLiteral("העמודה Copies אינה ברשומת המדבקה"));
     }
-    if (e) {
-        out.close();
+    // Returning without a commit drops what was written of the page.
+    if (e)
         return e.message;
-    }
     // No records: the page ends after its body tag.
     if (!anyRecord)
-        return out.close() ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+        return out.commit() ? QString() : writeFailed;
     if (labels)
         *labels = total;
     const long long perPage = (long long)page.PageRows * page.PageCols;
     const long long pages = (total + perPage - 1) / perPage;
 
     Statement records = db.prepare(sql, &e);
-    if (e) {
-        out.close();
+    if (e)
         return e.message;
-    }
     if (progress)
         progress->setProgress(0);
     std::array<int, kDirectLines> columns{};
@@ -429,16 +434,13 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
         if (progress && recordNumber % 5 == 0 && total > 0)
             progress->setProgress(double(recordNumber) / double(total));
     }
-    if (!e) {
-        out.line(QStringLiteral("</BODY>"));
-        out.line(QStringLiteral("</HTML>"));
-    }
-    const bool written = out.close();
     if (progress)
         progress->setProgress(0);
     if (e)
         return e.message;
-    return written ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+    out.line(QStringLiteral("</BODY>"));
+    out.line(QStringLiteral("</HTML>"));
+    return out.commit() ? QString() : writeFailed;
 }
 
 } // namespace tagora

@@ -49,7 +49,8 @@ QString LetterTable(const QVariant& value, const QString& className);
 // Writes the page of labels for the records of sql on dbPath: Windows-1255
 // (characters it lacks as numeric references), CRLF, a grid of labels per
 // printed page. The layout's lines must carry their FieldName and IsPrice.
-// Empty text on success.
+// Empty text on success. The page is written aside and renamed into place, so
+// a failure leaves no cut page behind (and an earlier page at the name stays).
 // labels, when given, receives the number of labels on the page.
 QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
                       const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress,

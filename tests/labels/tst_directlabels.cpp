@@ -366,6 +366,60 @@ private slots:
         QVERIFY2(shown.contains("729000000001X") && shown.contains("EAN-13"), qPrintable(shown));
         QVERIFY2(!shown.contains(QRegularExpression("Error|Invalid|digits")), qPrintable(shown));
     }
+
+    // A page that fails after its head leaves nothing of itself behind; an
+    // earlier page at that name stays as it was.
+    void failedPageLeavesNothing_data()
+    {
+        QTest::addColumn<QString>("db");
+        QTest::addColumn<QString>("sql");
+        QTest::newRow("no database") << "missing.tmp" << "SELECT 1 AS Copies";
+        QTest::newRow("query fails") << "" << "SELECT NoSuchColumn FROM tItems";
+    }
+    void failedPageLeavesNothing()
+    {
+        QFETCH(QString, db);
+        QFETCH(QString, sql);
+        LabelData data;
+        QTemporaryDir out;
+        const QString file = out.filePath("tgrlab1.htm");
+        QFile earlier(file);
+        QVERIFY(earlier.open(QIODevice::WriteOnly));
+        earlier.write("earlier page");
+        earlier.close();
+        DirectLabelLayout layout;
+        layout.lines[0] = textLine(0, "ItemKey");
+        const QString error
+            = CreateLabPage(file, db.isEmpty() ? data.docs : out.filePath(db), sql, layout, "0.00", nullptr);
+        QVERIFY(!error.isEmpty());
+        QCOMPARE(QDir(out.path()).entryList(QDir::Files | QDir::Hidden), QStringList{"tgrlab1.htm"});
+        QVERIFY(earlier.open(QIODevice::ReadOnly));
+        QCOMPARE(earlier.readAll(), QByteArray("earlier page"));
+    }
+
+    // A host calling the method reads the outcome; the user sees the failure.
+    void createLabFileTellsHost_data()
+    {
+        QTest::addColumn<bool>("goodDatabase");
+        QTest::newRow("written") << true;
+        QTest::newRow("failed") << false;
+    }
+    void createLabFileTellsHost()
+    {
+        QFETCH(bool, goodDatabase);
+        LabelData data;
+        CardFixture f;
+        directLabelLayout().lines[0] = textLine(0, "ItemKey");
+        const QString file = work.filePath(QStringLiteral("host%1.htm").arg(goodDatabase));
+        bool result = !goodDatabase;
+        QVERIFY(QMetaObject::invokeMethod(f.card.get(), "CreateLabFile", Q_RETURN_ARG(bool, result), Q_ARG(QString, file),
+                                          Q_ARG(QString, goodDatabase ? data.docs : data.folder + "/missing.tmp"),
+                                          Q_ARG(uchar, 1), Q_ARG(uchar, 1)));
+        directLabelLayout() = DirectLabelLayout{};
+        QCOMPARE(result, goodDatabase);
+        QCOMPARE(f.prompt->criticalCount(), goodDatabase ? 0 : 1);
+        QCOMPARE(QFile::exists(file), goodDatabase);
+    }
 };
 
 QTEST_MAIN(TestDirectLabels)
