@@ -108,9 +108,52 @@ int copiesOf(const QVariant& v)
     return d > 1e6 ? 1000000 : int(std::nearbyint(d));
 }
 
-QString lineText(const LabelLineDef& line, int index, const Statement& record, int column, const QString& priceFormat,
-                 int coinColumn, int maxTextLen)
+// The opening of the one-row tables the name line is written in.
+QString nameTableOpen(const QString& className)
 {
+    QString out = QStringLiteral("<table");
+    if (!className.isEmpty())
+        out += QStringLiteral(" class='") + className + QLatin1Char('\'');
+    return out + QStringLiteral(" cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>");
+}
+
+// The cell form turns brackets around for the browser; this turns them back.
+QChar unmirrored(QChar c)
+{
+    switch (c.unicode()) {
+    case '(': return QLatin1Char(')');
+    case ')': return QLatin1Char('(');
+    case '[': return QLatin1Char(']');
+    case ']': return QLatin1Char('[');
+    case '{': return QLatin1Char('}');
+    case '}': return QLatin1Char('{');
+    case '<': return QLatin1Char('>');
+    case '>': return QLatin1Char('<');
+    default: return c;
+    }
+}
+
+// A connection of type 2 keeps the cell form in the text's own (logical)
+// order. Cells from right to left would show it backwards, so it goes back to
+// plain text, which the browser lays out as it reads. A value that is not in
+// cell form (typed, not imported) is taken as it is.
+QString logicalFromCells(const QString& value)
+{
+    if (!value.startsWith(kCellSeparator))
+        return value;
+    QString text;
+    text.reserve(value.size() / 2);
+    for (const QChar c : value)
+        if (c != kCellSeparator)
+            text += unmirrored(c);
+    return text;
+}
+
+QString lineText(const LabelLineDef& line, int index, const Statement& record, int column, const QString& priceFormat,
+                 int coinColumn, int maxTextLen, short connType)
+{
+    const bool nameLine = line.FieldName.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0;
+    const bool logical = nameLine && connType == 2;
     const QVariant value = column >= 0 ? record.value(column) : QVariant();
     QString text;
     if (value.isValid() && !value.isNull()) {
@@ -118,13 +161,16 @@ QString lineText(const LabelLineDef& line, int index, const Statement& record, i
             text = FormatNumber(value, priceFormat) + QLatin1Char(' ')
                 + (coinColumn >= 0 ? record.value(coinColumn).toString() : QString());
         else
-            text = value.toString();
+            text = logical ? logicalFromCells(value.toString()) : value.toString();
     }
     if (!line.Prefix.isEmpty())
         text = line.Prefix + QLatin1Char(' ') + text;
     if (maxTextLen > 0 && text.size() > maxTextLen)
         text = text.left(maxTextLen);
-    if (line.FieldName.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0)
+    if (logical)
+        return nameTableOpen(QStringLiteral("L%1").arg(index)) + QStringLiteral("<td nowrap>") + escaped(text)
+            + QStringLiteral("</td></tr></table>");
+    if (nameLine)
         return LetterTable(text, QStringLiteral("L%1").arg(index));
     return escaped(text);
 }
@@ -286,10 +332,7 @@ QStringList WriteLabelStyles(const DirectLabelLayout& layout)
 QString LetterTable(const QVariant& value, const QString& className)
 {
     const QString text = value.isValid() && !value.isNull() ? value.toString() : QString();
-    QString out = QStringLiteral("<table");
-    if (!className.isEmpty())
-        out += QStringLiteral(" class='") + className + QLatin1Char('\'');
-    out += QStringLiteral(" cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>");
+    QString out = nameTableOpen(className);
     QString previous;
     for (const QChar c : text) {
         if (c == kCellSeparator)
@@ -373,6 +416,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
         columns[size_t(i)] = records.columnIndex(layout.lines[size_t(i)].FieldName);
     const int copiesColumn = records.columnIndex(QStringLiteral("Copies"));
     const int coinColumn = records.columnIndex(QStringLiteral("CoinSign"));
+    // The names were put in cell form for the connection in use.
+    const short connType = erpConnType();
 
     // The current record, moved past records that print no label.
     bool more = false;
@@ -417,7 +462,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
                                      + QStringLiteral("></img></td></tr>"));
                         else if (l.ViewType == 0)
                             out.line(QStringLiteral("    <tr align='center'><td class='L%1'>").arg(i)
-                                     + lineText(l, i, records, columns[size_t(i)], format, coinColumn, page.MaxTextLen)
+                                     + lineText(l, i, records, columns[size_t(i)], format, coinColumn, page.MaxTextLen,
+                                                connType)
                                      + QStringLiteral("</td></tr>"));
                     }
                     if (++counter >= copies) {

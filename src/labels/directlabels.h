@@ -44,6 +44,9 @@ QStringList WriteLabelStyles(const DirectLabelLayout& layout);
 // A text as a one-row table with a cell per character, so that its order
 // holds whatever the browser's direction rules; characters are escaped,
 // blanks are &nbsp; (a run of blanks one cell), cell separators dropped.
+// The first character is the rightmost: right for the cell form of a
+// connection of type 1, whose text is in display order. The page writes the
+// name of a type 2 connection, in logical order, as text instead.
 QString LetterTable(const QVariant& value, const QString& className);
 
 // Writes the page of labels for the records of sql on dbPath: Windows-1255

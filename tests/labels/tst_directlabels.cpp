@@ -29,6 +29,31 @@ QString readPage(const QString& path)
 // Refused barcodes for the message: record number and labels on the page.
 using Refused = QList<QPair<int, int>>;
 
+// How the browser lays out the name line of the first label, left to right:
+// "cells:" and the cells of a right-to-left letter table (each bracket drawn
+// mirrored, as in any right-to-left cell), or "text:" and the text of a single
+// cell, which the browser orders by the text's own direction.
+QString nameLine(const QString& html, int line)
+{
+    const QString table = html.section(QStringLiteral("<td class='L%1'>").arg(line), 1, 1).section("</table>", 0, 0);
+    static const QRegularExpression cell("<td[^>]*>(.*?)</td>");
+    QStringList cells;
+    for (auto it = cell.globalMatch(table); it.hasNext();) {
+        QString c = it.next().captured(1);
+        c.replace("&nbsp;", " ").replace("&lt;", "<").replace("&gt;", ">").replace("&#39;", "'").replace("&amp;", "&");
+        cells << c;
+    }
+    if (cells.size() == 1 && table.contains("<td nowrap>"))
+        return "text:" + cells.first();
+    const QString mirror = "()<>[]{}";
+    QString shown;
+    for (const QString& c : cells) {
+        const int m = c.size() == 1 ? int(mirror.indexOf(c)) : -1;
+        shown.prepend(m < 0 ? c : QString(mirror[m ^ 1]));
+    }
+    return "cells:" + shown;
+}
+
 LabelLineDef textLine(short field, const QString& column, const QString& prefix = {}, bool price = false)
 {
     LabelLineDef l;
@@ -216,6 +241,36 @@ private slots:
         const QString open = cls.isEmpty() ? QString("<table") : "<table class='" + cls + "'";
         QCOMPARE(LetterTable(value, cls), open + " cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>"
                                               + cells + "</tr></table>");
+    }
+
+    // The name line as the item import stores it for each connection type
+    // reads as the name: type 1 keeps the ERP's display order, type 2 the
+    // logical order, which the browser must lay out itself.
+    void nameLineReads_data()
+    {
+        QTest::addColumn<int>("connType");
+        QTest::addColumn<QString>("erpText");
+        QTest::addColumn<QString>("shown");
+        QTest::newRow("type 1, Latin") << 1 << "Makita DHP482 (18V)" << "cells:Makita DHP482 (18V)";
+        QTest::newRow("type 1, Hebrew") << 1 << "החדקמ" << "cells:החדקמ";
+        QTest::newRow("type 1, mixed") << 1 << "(Makita 18V) החדקמ" << "cells:(Makita 18V) החדקמ";
+        QTest::newRow("type 2, Latin") << 2 << "Makita DHP482 (18V)" << "text:Makita DHP482 (18V)";
+        QTest::newRow("type 2, Hebrew") << 2 << "מקדחה" << "text:מקדחה";
+        QTest::newRow("type 2, mixed") << 2 << "מקדחה (Makita 18V) <2>" << "text:מקדחה (Makita 18V) <2>";
+    }
+    void nameLineReads()
+    {
+        QFETCH(int, connType);
+        QFETCH(QString, erpText);
+        QFETCH(QString, shown);
+        LabelData data(QStringLiteral("UPDATE tItems SET VNItemName = '%1' WHERE ItemKey = 'A1'")
+                           .arg(ReverseForCells(erpText, short(connType)).replace("'", "''")));
+        DirectLabelLayout layout;
+        layout.lines[2] = textLine(16, "VNItemName");
+        setErpConnType(short(connType));
+        const QString html = page(data, layout, " And ItemKey = 'A1'");
+        setErpConnType(1);
+        QCOMPARE(nameLine(html, 2), shown);
     }
 
     void codePage()
