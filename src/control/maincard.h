@@ -88,7 +88,7 @@ public:
     Q_INVOKABLE short ReadAlterPricePRIORITY(const QString& CompPath, const QString& pDBFullName,
                                              const QVariant& pFromItemSort, const QVariant& pToItemSort,
                                              bool pByDocs, const QString& pTableName);
-    Q_INVOKABLE void CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType,
+    Q_INVOKABLE bool CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType,
                                    uchar pOrderBy);
     Q_INVOKABLE short ReadPriceListNamePriority(const QString& CompPath, const QString& pDBPath);
     Q_INVOKABLE void CreateListFile(const QString& pFileName, const QString& pDBName, uchar pQueryType,

@@ -57,14 +57,17 @@ bool MainCard::prepareDirectFields(QString* error)
     return true;
 }
 
-void MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
+// A host learns from the result whether the page is there; the user sees why not.
+bool MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
 {
     QString error;
     if (prepareDirectFields(&error))
         error = CreateLabPage(pFileName, pDBName, BuildItemQuery(pQueryType, pOrderBy).toString(), directLabelLayout(),
                               ui->txtPriceFormat->text(), this);
-    if (!error.isEmpty())
-        m_services.prompt->critical(titles::Fault, error);
+    if (error.isEmpty())
+        return true;
+    m_services.prompt->critical(titles::Fault, error);
+    return false;
 }
 
 void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
@@ -93,7 +96,8 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
         }
     }
     const QString page = QDir(folder).filePath(QStringLiteral("tgrlab1.htm"));
-    error = CreateLabPage(page, dbPath, sql, layout, ui->txtPriceFormat->text(), this);
+    long long labels = 0;
+    error = CreateLabPage(page, dbPath, sql, layout, ui->txtPriceFormat->text(), this, &labels);
     if (!error.isEmpty())
         return fail(error);
     if (!m_services.pages->showPage(page, &error))
@@ -101,17 +105,9 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
 
     // A value the barcode cannot carry gets no picture rather than a wrong
     // one; the user learns which labels lack theirs.
-    if (!refused.isEmpty()) {
-        QStringList lines;
-        for (const BarcodeRefusal& r : refused.mid(0, 10))
-            lines << QStringLiteral("רשומה %1: '%2' - %3").arg(r.record).arg(r.data, r.reason);
-        if (refused.size() > 10)
-            lines << QStringLiteral("ועוד %1").arg(refused.size() - 10);
-        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention,
-                                   QStringLiteral("%1 מדבקות הודפסו ללא ברקוד, כי לא ניתן לקודד את הערך בסוג הברקוד שנבחר:\n")
-                                           .arg(refused.size())
-                                       + lines.join(QLatin1Char('\n')));
-    }
+    const QString lacking = BarcodeRefusalMessage(refused, labels);
+    if (!lacking.isEmpty())
+        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention, lacking);
 }
 
 } // namespace tagora

@@ -22,16 +22,23 @@ namespace tagora {
 namespace {
 const QString kAutomationSection = QStringLiteral("Automation");
 const QString kJournalKey = QStringLiteral("JournalFile");
+
+// The ticks and expressions of the label field table, read the same way for
+// the query and for the fields a run sends, so the two agree on every column.
+void readFieldRows(const MainCard& card, LabelQuerySettings& s)
+{
+    for (int row = 0; row < LabelFieldCount; ++row) {
+        s.sent[size_t(row)] = card.control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState() == Qt::Checked;
+        if (auto* expr = card.control<QLineEdit>(QStringLiteral("txtFldExpr(%1)").arg(row)))
+            s.expressions[size_t(row)] = expr->text();
+    }
+}
 } // namespace
 
 QVariant MainCard::BuildItemQuery(uchar pQueryType, uchar pOrderBy)
 {
     LabelQuerySettings s;
-    for (int row = 0; row < LabelFieldCount; ++row) {
-        s.sent[size_t(row)] = control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState() == Qt::Checked;
-        if (auto* expr = control<QLineEdit>(QStringLiteral("txtFldExpr(%1)").arg(row)))
-            s.expressions[size_t(row)] = expr->text();
-    }
+    readFieldRows(*this, s);
     s.useAccountKey = ui->ChkUseAccountKey->checkState() == Qt::Checked;
     s.accountKey = ui->txtAccountKey->text();
     s.companyName = ui->txtCompanyName->text();
@@ -55,8 +62,12 @@ short MainCard::RunOLE(const QString& DefaultLabelName, short /*Copies*/, uchar 
     // Roll printers take the labels last to first.
     const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
     r.sql = (ByPlate ? BuildItemQueryFromPlate(pQueryType, order) : BuildItemQuery(pQueryType, order)).toString();
+    LabelQuerySettings rows;
+    readFieldRows(*this, rows);
     for (int row = 0; row < LabelFieldCount; ++row) {
-        if (control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState() != Qt::Checked)
+        // The label list's record fills an expression row from its parameter,
+        // not from an expression.
+        if (ByPlate ? !rows.sent[size_t(row)] : !RowIsSent(rows, row))
             continue;
         const auto* name = control<QLabel>(QStringLiteral("LblFldName(%1)").arg(row));
         const auto* desc = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(row));

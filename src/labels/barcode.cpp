@@ -54,35 +54,86 @@ constexpr int kDefaultResolution = 200;
 // zint refuses a scale above 100, i.e. modules wider than 200 pixels.
 constexpr double kMaxModulePixels = 200.0;
 
-bool allDigits(const QString& text)
-{
-    for (QChar c : text) {
-        if (c < QLatin1Char('0') || c > QLatin1Char('9'))
-            return false;
-    }
-    return true;
-}
-
-bool allWithin(const QString& text, ushort first, ushort last)
-{
-    for (QChar c : text) {
-        if (c.unicode() < first || c.unicode() > last)
-            return false;
-    }
-    return true;
-}
-
+// The symbology as the designer's list names it, so the user knows it again.
 QString symbologyName(int code, bool fullAscii)
 {
     switch (code) {
-    case 0: return fullAscii ? QStringLiteral("Code 39 full ASCII") : QStringLiteral("Code 39");
-    case 1: return QStringLiteral("Code 128");
-    case 14: return QStringLiteral("Code 128 subset A");
-    case 15: return QStringLiteral("Code 128 subset B");
+    case 0: return fullAscii ? QStringLiteral("CODE-39 Ascii") : QStringLiteral("CODE-39");
+    case 1: return QStringLiteral("CODE-128");
+    case 14: return QStringLiteral("CODE-128A");
+    case 15: return QStringLiteral("CODE-128B");
     case 9: return QStringLiteral("EAN-8");
     case 10: return QStringLiteral("EAN-13");
     case 4: return QStringLiteral("Interleaved 2 of 5");
-    default: return QStringLiteral("barcode type %1").arg(code);
+    default: return QStringLiteral("מסוג %1").arg(code);
+    }
+}
+
+QString invalidCharacter(QChar c, const QString& allowed)
+{
+    const QString shown = c.unicode() < 0x20 || c.unicode() == 0x7F
+        ? QStringLiteral("תו הבקרה שקודו %1").arg(c.unicode())
+        : QStringLiteral("התו '%1'").arg(c);
+    return QStringLiteral("%1 אינו חוקי: %2").arg(shown, allowed);
+}
+
+// The first character of data that zint's symbology does not carry, with
+// what it does carry; empty when every character is one it carries.
+QString refusedCharacter(int symbology, const QString& data)
+{
+    for (const QChar c : data) {
+        const ushort u = c.unicode();
+        switch (symbology) {
+        case BARCODE_CODE39:
+            if (!((u >= '0' && u <= '9') || (u >= 'A' && u <= 'Z') || QStringLiteral(" -.$/+%").contains(c)))
+                return invalidCharacter(c, QStringLiteral("מותרים רק ספרות, אותיות גדולות באנגלית, רווח והסימנים - . $ / + %"));
+            break;
+        case BARCODE_EXCODE39:
+            if (u > 0x7F)
+                return invalidCharacter(c, QStringLiteral("מותרים רק אותיות באנגלית, ספרות, סימנים ותווי בקרה"));
+            break;
+        case BARCODE_CODE128:
+            if (u > 0xFF)
+                return invalidCharacter(c, QStringLiteral("מותרים רק אותיות לטיניות, ספרות וסימנים"));
+            break;
+        default: break;
+        }
+    }
+    return QString();
+}
+
+// The check digit an EAN of full length should end with.
+QChar eanCheckDigit(const QString& digits)
+{
+    int sum = 0;
+    int weight = 3;
+    for (int i = int(digits.size()) - 2; i >= 0; --i) {
+        sum += (digits[i].unicode() - '0') * weight;
+        weight = 4 - weight;
+    }
+    return QChar('0' + (10 - sum % 10) % 10);
+}
+
+// Why zint refused to encode, in words for the user.
+QString encodeRefusal(int rc, const zint_symbol& symbol, const QString& data)
+{
+    switch (rc) {
+    case ZINT_ERROR_TOO_LONG:
+        return QStringLiteral("הערך ארוך מדי לסוג ברקוד זה (%1 תווים)").arg(data.size());
+    case ZINT_ERROR_INVALID_DATA: {
+        const QString character = refusedCharacter(symbol.symbology, data);
+        return character.isEmpty() ? QStringLiteral("הערך מכיל תווים שסוג ברקוד זה אינו מקבל") : character;
+    }
+    case ZINT_ERROR_INVALID_CHECK:
+        if (symbol.symbology == BARCODE_EANX_CHK && !data.isEmpty())
+            return QStringLiteral("ספרת הביקורת שגויה: %1 במקום %2").arg(data.back()).arg(eanCheckDigit(data));
+        return QStringLiteral("ספרת הביקורת שגויה");
+    case ZINT_ERROR_INVALID_OPTION: return QStringLiteral("הגדרות הברקוד אינן מתאימות לסוג ברקוד זה");
+    case ZINT_ERROR_ENCODING_PROBLEM: return QStringLiteral("תקלה פנימית בקידוד הערך");
+    case ZINT_ERROR_FILE_ACCESS:
+    case ZINT_ERROR_FILE_WRITE: return QStringLiteral("לא ניתן לכתוב את קובץ התמונה");
+    case ZINT_ERROR_MEMORY: return QStringLiteral("אין די זיכרון");
+    default: return QStringLiteral("ספריית הברקודים החזירה שגיאה %1").arg(rc);
     }
 }
 
@@ -104,6 +155,20 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
         *why = text;
         return false;
     };
+    if (data.isEmpty())
+        return refuse(QStringLiteral("אין ערך לקידוד"));
+    auto firstOutside = [&data](ushort first, ushort last) {
+        for (QChar c : data)
+            if (c.unicode() < first || c.unicode() > last)
+                return c;
+        return QChar();
+    };
+    auto firstNonDigit = [&data]() {
+        for (QChar c : data)
+            if (c < QLatin1Char('0') || c > QLatin1Char('9'))
+                return c;
+        return QChar();
+    };
     switch (code) {
     case 0:
         if (fullAscii) {
@@ -111,7 +176,7 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
         } else {
             for (QChar c : data) {
                 if (c.isLower())
-                    return refuse(QStringLiteral("Code 39 has no lower-case letters (full-ASCII Code 39 has)"));
+                    return refuse(invalidCharacter(c, QStringLiteral("ב-CODE-39 אין אותיות קטנות (יש ב-CODE-39 Ascii)")));
             }
             recipe->symbology = BARCODE_CODE39;
         }
@@ -121,20 +186,20 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
         recipe->symbology = BARCODE_CODE128;
         return true;
     case 14:
-        if (!allWithin(data, 0x00, 0x5F))
-            return refuse(QStringLiteral("subset A holds upper-case letters, digits, punctuation and control characters only"));
+        if (const QChar c = firstOutside(0x00, 0x5F); !c.isNull())
+            return refuse(invalidCharacter(c, QStringLiteral("מותרים רק אותיות גדולות באנגלית, ספרות, סימנים ותווי בקרה")));
         recipe->symbology = BARCODE_CODE128B;
         return true;
     case 15:
-        if (!allWithin(data, 0x20, 0x7F))
-            return refuse(QStringLiteral("subset B holds printable ASCII characters only"));
+        if (const QChar c = firstOutside(0x20, 0x7F); !c.isNull())
+            return refuse(invalidCharacter(c, QStringLiteral("מותרים רק אותיות באנגלית, ספרות וסימנים")));
         recipe->symbology = BARCODE_CODE128B;
         return true;
     case 9:
     case 10: {
         const int full = code == 9 ? 8 : 13;
-        if (!allDigits(data))
-            return refuse(QStringLiteral("EAN takes digits only"));
+        if (const QChar c = firstNonDigit(); !c.isNull())
+            return refuse(invalidCharacter(c, QStringLiteral("מותרות ספרות בלבד")));
         recipe->quietZones = false;
         if (data.size() == full) {
             recipe->symbology = BARCODE_EANX_CHK; // the last digit is verified
@@ -145,23 +210,28 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
             return true;
         }
         if (checkDigit)
-            return refuse(QStringLiteral("needs %1 digits, or %2 with its check digit").arg(full - 1).arg(full));
-        return refuse(QStringLiteral("needs %1 digits including the check digit").arg(full));
+            return refuse(QStringLiteral("אורך שגוי: %1 ספרות, ונדרשות %2 ספרות, או %3 עם ספרת הביקורת")
+                              .arg(data.size())
+                              .arg(full - 1)
+                              .arg(full));
+        return refuse(QStringLiteral("אורך שגוי: %1 ספרות, ונדרשות %2 ספרות כולל ספרת הביקורת").arg(data.size()).arg(full));
     }
     case 4: {
-        if (!allDigits(data))
-            return refuse(QStringLiteral("Interleaved 2 of 5 takes digits only"));
+        if (const QChar c = firstNonDigit(); !c.isNull())
+            return refuse(invalidCharacter(c, QStringLiteral("מותרות ספרות בלבד")));
         const int digits = int(data.size()) + (checkDigit ? 1 : 0);
         if (digits % 2 != 0) {
-            return refuse(checkDigit ? QStringLiteral("needs an odd number of digits (the check digit makes it even)")
-                                     : QStringLiteral("needs an even number of digits"));
+            return refuse(checkDigit
+                              ? QStringLiteral("אורך שגוי: %1 ספרות, ונדרש מספר אי-זוגי של ספרות (ספרת הביקורת משלימה לזוגי)")
+                                    .arg(data.size())
+                              : QStringLiteral("אורך שגוי: %1 ספרות, ונדרש מספר זוגי של ספרות").arg(data.size()));
         }
         recipe->symbology = BARCODE_C25INTER;
         recipe->checkOption = checkDigit ? 1 : 0;
         return true;
     }
     default:
-        return refuse(QStringLiteral("this barcode type is not supported"));
+        return refuse(QStringLiteral("סוג הברקוד אינו נתמך"));
     }
 }
 
@@ -290,8 +360,9 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     QString shown = in ? in->data : QString();
     if (shown.size() > 40)
         shown = shown.left(40) + QStringLiteral("...");
-    const QString what = in ? QStringLiteral("Cannot draw %1 \"%2\": ").arg(symbologyName(in->code, in->c39Ascii), shown)
-                            : QStringLiteral("Cannot draw a barcode: ");
+    // The value, the barcode type and why: the user fixes the value or the type.
+    const QString what = in ? QStringLiteral("ברקוד %1 לערך \"%2\": ").arg(symbologyName(in->code, in->c39Ascii), shown)
+                            : QStringLiteral("ברקוד: ");
     auto fail = [&](const QString& why) {
         if (error)
             *error = what + why;
@@ -302,21 +373,21 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     // from an earlier job would be printed for this record.
     const QFileInfo target(path);
     if ((target.exists() || target.isSymLink()) && !QFile::remove(path))
-        return fail(QStringLiteral("the old picture %1 cannot be removed").arg(QDir::toNativeSeparators(path)));
+        return fail(QStringLiteral("לא ניתן למחוק את התמונה הקודמת '%1'").arg(QDir::toNativeSeparators(path)));
     if (!in)
-        return fail(QStringLiteral("barcode library handle %1 is not open").arg(handle));
+        return fail(QStringLiteral("מזהה ספריית הברקודים %1 אינו פתוח").arg(handle));
 
     if (in->unit != 0)
-        return fail(QStringLiteral("unit %1 is not supported (0 = inches)").arg(in->unit));
+        return fail(QStringLiteral("יחידת המידה %1 אינה נתמכת (0 = אינצ'ים)").arg(in->unit));
     if (in->rotation < 0 || in->rotation > 3)
-        return fail(QStringLiteral("rotation %1 is not supported (0 to 3 quarter turns)").arg(in->rotation));
+        return fail(QStringLiteral("סיבוב %1 אינו נתמך (0 עד 3 רבעי סיבוב)").arg(in->rotation));
     const double modulePixelsExact = double(in->dimX) * in->resoX;
     if (!(modulePixelsExact > 0) || modulePixelsExact > kMaxModulePixels)
-        return fail(QStringLiteral("narrow bar width %1 is out of range").arg(QString::number(double(in->dimX))));
+        return fail(QStringLiteral("רוחב הפס הצר %1 מחוץ לתחום").arg(QString::number(double(in->dimX))));
     const int modulePixels = qMax(1, int(std::lround(modulePixelsExact)));
     const double heightModules = double(in->barHeight) * in->resoY / modulePixels;
     if (!std::isfinite(heightModules))
-        return fail(QStringLiteral("bar height %1 is out of range").arg(QString::number(double(in->barHeight))));
+        return fail(QStringLiteral("גובה הפסים %1 מחוץ לתחום").arg(QString::number(double(in->barHeight))));
 
     Recipe recipe;
     QString why;
@@ -328,7 +399,7 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     in->symbol.reset(ZBarcode_Create());
     zint_symbol* symbol = in->symbol.get();
     if (!symbol)
-        return fail(QStringLiteral("out of memory"));
+        return fail(QStringLiteral("אין די זיכרון"));
     symbol->symbology = recipe.symbology;
     symbol->input_mode = UNICODE_MODE;
     symbol->option_2 = recipe.checkOption;
@@ -342,7 +413,7 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     const QByteArray utf8 = in->data.toUtf8();
     int rc = ZBarcode_Encode(symbol, reinterpret_cast<const unsigned char*>(utf8.constData()), int(utf8.size()));
     if (rc >= ZINT_ERROR)
-        return fail(QString::fromUtf8(symbol->errtxt));
+        return fail(encodeRefusal(rc, *symbol, in->data));
 
     // zint chooses the format by the name's extension and keeps the name in a
     // fixed buffer; any other name is written in a scratch folder and moved.
@@ -353,10 +424,10 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     QString written = path;
     if (!direct) {
         if (!scratch.isValid())
-            return fail(QStringLiteral("no scratch folder: %1").arg(scratch.errorString()));
+            return fail(QStringLiteral("אין תיקייה זמנית לתמונה"));
         written = scratch.filePath(QStringLiteral("picture.bmp"));
         if (QFile::encodeName(written).size() >= qsizetype(sizeof symbol->outfile))
-            return fail(QStringLiteral("the temporary folder's name is too long"));
+            return fail(QStringLiteral("שם התיקייה הזמנית ארוך מדי"));
     }
     const QByteArray outfile = QFile::encodeName(written);
     qstrncpy(symbol->outfile, outfile.constData(), sizeof symbol->outfile);
@@ -364,14 +435,14 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     rc = ZBarcode_Print(symbol, in->rotation * 90);
     if (rc >= ZINT_ERROR) {
         QFile::remove(written);
-        return fail(QString::fromUtf8(symbol->errtxt));
+        return fail(encodeRefusal(rc, *symbol, in->data));
     }
     if (!direct && !QFile::rename(written, path)) {
         QFile::remove(path);
-        return fail(QStringLiteral("the picture cannot be written to %1").arg(QDir::toNativeSeparators(path)));
+        return fail(QStringLiteral("לא ניתן לכתוב את התמונה אל '%1'").arg(QDir::toNativeSeparators(path)));
     }
     if (!QFileInfo::exists(path))
-        return fail(QStringLiteral("the picture %1 was not written").arg(QDir::toNativeSeparators(path)));
+        return fail(QStringLiteral("התמונה '%1' לא נכתבה").arg(QDir::toNativeSeparators(path)));
     return true;
 }
 

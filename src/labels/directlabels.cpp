@@ -9,6 +9,8 @@
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
+#include <QSaveFile>
+#include <QSet>
 #include <QStringEncoder>
 
 namespace tagora {
@@ -31,6 +33,9 @@ QString escaped(const QString& text)
 
 // The page's lines, in the code page it declares, each with CRLF. A character
 // the code page lacks goes as a numeric reference rather than a question mark.
+// The page is written aside and takes its name only when whole: a failure
+// leaves neither a cut page nor a stray file, and an earlier page at that
+// name stays until a whole one replaces it.
 class PageWriter {
 public:
     explicit PageWriter(const QString& path)
@@ -38,8 +43,7 @@ public:
     {
     }
 
-    bool open() { return m_file.open(QIODevice::WriteOnly | QIODevice::Truncate); }
-    QString error() const { return m_file.errorString(); }
+    bool open() { return m_file.open(QIODevice::WriteOnly); }
 
     void line(const QString& text) { write(text + QStringLiteral("\r\n")); }
 
@@ -65,14 +69,19 @@ public:
             m_failed = true;
     }
 
-    bool close()
+    // Puts the page in place; false, with the page left out, when any write failed.
+    bool commit()
     {
-        m_file.close();
-        return !m_failed && m_file.error() == QFileDevice::NoError;
+        if (m_failed) {
+            m_file.cancelWriting();
+            m_file.commit();
+            return false;
+        }
+        return m_file.commit();
     }
 
 private:
-    QFile m_file;
+    QSaveFile m_file;
     QStringEncoder m_encoder{"windows-1255"};
     bool m_failed = false;
 };
@@ -99,9 +108,52 @@ int copiesOf(const QVariant& v)
     return d > 1e6 ? 1000000 : int(std::nearbyint(d));
 }
 
-QString lineText(const LabelLineDef& line, int index, const Statement& record, int column, const QString& priceFormat,
-                 int coinColumn, int maxTextLen)
+// The opening of the one-row tables the name line is written in.
+QString nameTableOpen(const QString& className)
 {
+    QString out = QStringLiteral("<table");
+    if (!className.isEmpty())
+        out += QStringLiteral(" class='") + className + QLatin1Char('\'');
+    return out + QStringLiteral(" cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>");
+}
+
+// The cell form turns brackets around for the browser; this turns them back.
+QChar unmirrored(QChar c)
+{
+    switch (c.unicode()) {
+    case '(': return QLatin1Char(')');
+    case ')': return QLatin1Char('(');
+    case '[': return QLatin1Char(']');
+    case ']': return QLatin1Char('[');
+    case '{': return QLatin1Char('}');
+    case '}': return QLatin1Char('{');
+    case '<': return QLatin1Char('>');
+    case '>': return QLatin1Char('<');
+    default: return c;
+    }
+}
+
+// A connection of type 2 keeps the cell form in the text's own (logical)
+// order. Cells from right to left would show it backwards, so it goes back to
+// plain text, which the browser lays out as it reads. A value that is not in
+// cell form (typed, not imported) is taken as it is.
+QString logicalFromCells(const QString& value)
+{
+    if (!value.startsWith(kCellSeparator))
+        return value;
+    QString text;
+    text.reserve(value.size() / 2);
+    for (const QChar c : value)
+        if (c != kCellSeparator)
+            text += unmirrored(c);
+    return text;
+}
+
+QString lineText(const LabelLineDef& line, int index, const Statement& record, int column, const QString& priceFormat,
+                 int coinColumn, int maxTextLen, short connType)
+{
+    const bool nameLine = line.FieldName.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0;
+    const bool logical = nameLine && connType == 2;
     const QVariant value = column >= 0 ? record.value(column) : QVariant();
     QString text;
     if (value.isValid() && !value.isNull()) {
@@ -109,13 +161,16 @@ QString lineText(const LabelLineDef& line, int index, const Statement& record, i
             text = FormatNumber(value, priceFormat) + QLatin1Char(' ')
                 + (coinColumn >= 0 ? record.value(coinColumn).toString() : QString());
         else
-            text = value.toString();
+            text = logical ? logicalFromCells(value.toString()) : value.toString();
     }
     if (!line.Prefix.isEmpty())
         text = line.Prefix + QLatin1Char(' ') + text;
     if (maxTextLen > 0 && text.size() > maxTextLen)
         text = text.left(maxTextLen);
-    if (line.FieldName.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0)
+    if (logical)
+        return nameTableOpen(QStringLiteral("L%1").arg(index)) + QStringLiteral("<td nowrap>") + escaped(text)
+            + QStringLiteral("</td></tr></table>");
+    if (nameLine)
         return LetterTable(text, QStringLiteral("L%1").arg(index));
     return escaped(text);
 }
@@ -170,6 +225,7 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
     const int col = records.columnIndex(column);
     if (col < 0)
         return QStringLiteral("העמודה %1 אינה ברשומת המדבקה").arg(column);
+    const int copiesColumn = records.columnIndex(QStringLiteral("Copies"));
     const int code = libraryBarType(bar.BarType, bar);
     const int handle = library.A1OpenInstance();
     int record = 0;
@@ -189,12 +245,56 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
         if (!DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
                          &reason)
             && refusals)
-            refusals->push_back({record, data, reason});
+            refusals->push_back({record, copiesOf(copiesColumn >= 0 ? records.value(copiesColumn) : QVariant()), data,
+                                 reason});
     }
     if (step == Statement::Step::Error)
         failure = records.error().message;
     library.A1CloseInstance(handle);
     return failure;
+}
+
+QString BarcodeRefusalMessage(const QVector<BarcodeRefusal>& refused, long long labelsOnPage)
+{
+    // A record with no copies is not on the page; one refused on two lines
+    // still lacks its barcode on the same labels.
+    QVector<BarcodeRefusal> shown;
+    QSet<int> records;
+    long long lacking = 0;
+    for (const BarcodeRefusal& r : refused) {
+        if (r.labels <= 0)
+            continue;
+        shown.push_back(r);
+        if (!records.contains(r.record)) {
+            records.insert(r.record);
+            lacking += r.labels;
+        }
+    }
+    if (shown.isEmpty())
+        return QString();
+    std::stable_sort(shown.begin(), shown.end(),
+                     [](const BarcodeRefusal& a, const BarcodeRefusal& b) { return a.record < b.record; });
+    const long long total = qMax(labelsOnPage, lacking);
+    const QString one = QStringLiteral(" תודפס בלי ברקוד, כי לא ניתן לקודד את הערך שלה בסוג הברקוד שנבחר:");
+    const QString many = QStringLiteral(" יודפסו בלי ברקוד, כי לא ניתן לקודד את הערך שלהן בסוג הברקוד שנבחר:");
+    QString head;
+    if (total == 1)
+        head = QStringLiteral("המדבקה שבדף") + one;
+    else if (lacking == total)
+        head = QStringLiteral("כל %1 המדבקות שבדף").arg(total) + many;
+    else if (lacking == 1)
+        head = QStringLiteral("מדבקה אחת מתוך %1 המדבקות שבדף").arg(total) + one;
+    else
+        head = QStringLiteral("%1 מתוך %2 המדבקות שבדף").arg(lacking).arg(total) + many;
+    QStringList lines{head};
+    constexpr int kListed = 10;
+    for (const BarcodeRefusal& r : shown.mid(0, kListed)) {
+        const QString count = r.labels == 1 ? QStringLiteral("מדבקה אחת") : QStringLiteral("%1 מדבקות").arg(r.labels);
+        lines << QStringLiteral("רשומה %1 (%2): %3").arg(r.record).arg(count, r.reason);
+    }
+    if (shown.size() > kListed)
+        lines << QStringLiteral("ועוד %1 ברקודים שלא נוצרו").arg(shown.size() - kListed);
+    return lines.join(QLatin1Char('\n'));
 }
 
 QStringList WriteLabelStyles(const DirectLabelLayout& layout)
@@ -232,10 +332,7 @@ QStringList WriteLabelStyles(const DirectLabelLayout& layout)
 QString LetterTable(const QVariant& value, const QString& className)
 {
     const QString text = value.isValid() && !value.isNull() ? value.toString() : QString();
-    QString out = QStringLiteral("<table");
-    if (!className.isEmpty())
-        out += QStringLiteral(" class='") + className + QLatin1Char('\'');
-    out += QStringLiteral(" cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>");
+    QString out = nameTableOpen(className);
     QString previous;
     for (const QChar c : text) {
         if (c == kCellSeparator)
@@ -249,8 +346,11 @@ QString LetterTable(const QVariant& value, const QString& className)
 }
 
 QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
-                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress)
+                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress,
+                      long long* labels)
 {
+    if (labels)
+        *labels = 0;
     const LabelPageDef& page = layout.page;
     if (page.PageRows <= 0 || page.PageCols <= 0)
         return QStringLiteral("מבנה דף המדבקות אינו תקין: %1 שורות, %2 מדבקות בשורה").arg(page.PageRows).arg(page.PageCols);
@@ -259,10 +359,10 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     const QString picture = pictureAttributes(layout.bar);
     const QString format = priceFormat.trimmed().isEmpty() ? QStringLiteral("0.00") : priceFormat.trimmed();
 
-    QFile::remove(fileName);
+    const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
     PageWriter out(fileName);
     if (!out.open())
-        return out.error();
+        return QStringLiteral("לא ניתן ליצור את הקובץ '%1'").arg(QDir::toNativeSeparators(fileName));
     out.line(QStringLiteral("<HTML>"));
     out.line(QStringLiteral("<HEAD>"));
     out.line(QStringLiteral("<TITLE>מדבקות פריטים</TITLE>"));
@@ -295,21 +395,20 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
         if (!e && copies < 0 && first.columnCount() > 0)
             e = DbError::other(QStringLiteral("העמודה Copies אינה ברשומת המדבקה"));
     }
-    if (e) {
-        out.close();
+    // Returning without a commit drops what was written of the page.
+    if (e)
         return e.message;
-    }
     // No records: the page ends after its body tag.
     if (!anyRecord)
-        return out.close() ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+        return out.commit() ? QString() : writeFailed;
+    if (labels)
+        *labels = total;
     const long long perPage = (long long)page.PageRows * page.PageCols;
     const long long pages = (total + perPage - 1) / perPage;
 
     Statement records = db.prepare(sql, &e);
-    if (e) {
-        out.close();
+    if (e)
         return e.message;
-    }
     if (progress)
         progress->setProgress(0);
     std::array<int, kDirectLines> columns{};
@@ -317,6 +416,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
         columns[size_t(i)] = records.columnIndex(layout.lines[size_t(i)].FieldName);
     const int copiesColumn = records.columnIndex(QStringLiteral("Copies"));
     const int coinColumn = records.columnIndex(QStringLiteral("CoinSign"));
+    // The names were put in cell form for the connection in use.
+    const short connType = erpConnType();
 
     // The current record, moved past records that print no label.
     bool more = false;
@@ -361,7 +462,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
                                      + QStringLiteral("></img></td></tr>"));
                         else if (l.ViewType == 0)
                             out.line(QStringLiteral("    <tr align='center'><td class='L%1'>").arg(i)
-                                     + lineText(l, i, records, columns[size_t(i)], format, coinColumn, page.MaxTextLen)
+                                     + lineText(l, i, records, columns[size_t(i)], format, coinColumn, page.MaxTextLen,
+                                                connType)
                                      + QStringLiteral("</td></tr>"));
                     }
                     if (++counter >= copies) {
@@ -378,16 +480,13 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
         if (progress && recordNumber % 5 == 0 && total > 0)
             progress->setProgress(double(recordNumber) / double(total));
     }
-    if (!e) {
-        out.line(QStringLiteral("</BODY>"));
-        out.line(QStringLiteral("</HTML>"));
-    }
-    const bool written = out.close();
     if (progress)
         progress->setProgress(0);
     if (e)
         return e.message;
-    return written ? QString() : QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+    out.line(QStringLiteral("</BODY>"));
+    out.line(QStringLiteral("</HTML>"));
+    return out.commit() ? QString() : writeFailed;
 }
 
 } // namespace tagora

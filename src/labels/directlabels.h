@@ -21,9 +21,15 @@ QString PrepareJobFolder(const QString& folder);
 // A record whose barcode the symbology cannot encode: it gets no picture.
 struct BarcodeRefusal {
     int record = 0;
+    int labels = 0;     // the record's labels on the page (its copies)
     QString data;
-    QString reason;
+    QString reason;     // the barcode type, the value and why, in Hebrew
 };
+
+// The attention message after a job whose page has labels without their
+// barcode: how many of the page's labels lack one, and why, record by
+// record. Empty when no label on the page lacks one.
+QString BarcodeRefusalMessage(const QVector<BarcodeRefusal>& refused, long long labelsOnPage);
 
 // The pictures of one barcode line, one per record with a text value, named
 // by field index and record number. Empty text on success; refusals of the
@@ -38,14 +44,20 @@ QStringList WriteLabelStyles(const DirectLabelLayout& layout);
 // A text as a one-row table with a cell per character, so that its order
 // holds whatever the browser's direction rules; characters are escaped,
 // blanks are &nbsp; (a run of blanks one cell), cell separators dropped.
+// The first character is the rightmost: right for the cell form of a
+// connection of type 1, whose text is in display order. The page writes the
+// name of a type 2 connection, in logical order, as text instead.
 QString LetterTable(const QVariant& value, const QString& className);
 
 // Writes the page of labels for the records of sql on dbPath: Windows-1255
 // (characters it lacks as numeric references), CRLF, a grid of labels per
 // printed page. The layout's lines must carry their FieldName and IsPrice.
-// Empty text on success.
+// Empty text on success. The page is written aside and renamed into place, so
+// a failure leaves no cut page behind (and an earlier page at the name stays).
+// labels, when given, receives the number of labels on the page.
 QString CreateLabPage(const QString& fileName, const QString& dbPath, const QString& sql,
-                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress);
+                      const DirectLabelLayout& layout, const QString& priceFormat, ProgressSink* progress,
+                      long long* labels = nullptr);
 
 // The cell size attribute value for n rows or columns: 100 / n with one decimal, at least two digits.
 QString cellPercent(int count);

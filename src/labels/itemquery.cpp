@@ -31,6 +31,14 @@ QString ItemRangeCriteria(const QString& fromItem, const QString& toItem, const 
     return criteria;
 }
 
+bool RowIsSent(const LabelQuerySettings& s, int row)
+{
+    if (row < 0 || row >= LabelFieldCount || !s.sent[size_t(row)])
+        return false;
+    // "()" is no SQL: a ticked expression row left blank would fail the whole query.
+    return row < FirstExpressionRow || !s.expressions[size_t(row)].trimmed().isEmpty();
+}
+
 QString BuildItemQuery(const LabelQuerySettings& s, int queryType, int orderBy)
 {
     const bool account = s.useAccountKey && !s.accountKey.isEmpty();
@@ -136,7 +144,7 @@ QString BuildItemQuery(const LabelQuerySettings& s, int queryType, int orderBy)
     if (sent(32))
         sql += QStringLiteral(", '") + StripQuoteChars(s.companyName) + QStringLiteral("' As CompName");
     for (int row = FirstExpressionRow; row < LabelFieldCount; ++row) {
-        if (!sent(row))
+        if (!RowIsSent(s, row))
             continue;
         QString expression = s.expressions[size_t(row)];
         expression.replace(QLatin1Char('"'), QLatin1Char('\''));

@@ -22,6 +22,11 @@ struct LabelQuerySettings {
 enum : int { QueryByItems = 1, QueryByDocuments = 2 };
 enum : int { OrderAscending = 1, OrderDescending = 2 };
 
+// Whether a row of the label field table is sent: ticked, and for an
+// expression row only with an expression, since a blank one has no column in
+// the record. Whatever sends fields follows the query in this.
+bool RowIsSent(const LabelQuerySettings& settings, int row);
+
 // The SQL of the label-data record, in SQLite's words: the fixed item
 // columns, the columns of the query type, then one column per sent row,
 // with placeholder texts where the query type has no data. Account keys and

@@ -165,7 +165,8 @@ private:
 };
 
 // Collects records (one AddRecord before each after the first, a quantity per
-// record) and prints them together: at the end, and before a header label.
+// record) and prints them together: at the end, before a header label, and
+// before another label file is opened, since opening drops what was collected.
 class FastLabel : public LabelProgram {
 public:
     FastLabel()
@@ -212,8 +213,10 @@ public:
     {
         if (!beforeHeader) {
             trace.step = 4;
+            // Only records collected since the last open or print are pending.
+            const bool pending = !m_firstRecord;
             m_firstRecord = true;
-            return true;
+            return !pending || call(*m_app, QStringLiteral("LabelPrint"), {}, error);
         }
         trace.step = 12;
         return call(*m_app, QStringLiteral("LabelPrint"), {}, error);

@@ -26,6 +26,34 @@ QString readPage(const QString& path)
     return QStringDecoder("windows-1255").decode(f.readAll());
 }
 
+// Refused barcodes for the message: record number and labels on the page.
+using Refused = QList<QPair<int, int>>;
+
+// How the browser lays out the name line of the first label, left to right:
+// "cells:" and the cells of a right-to-left letter table (each bracket drawn
+// mirrored, as in any right-to-left cell), or "text:" and the text of a single
+// cell, which the browser orders by the text's own direction.
+QString nameLine(const QString& html, int line)
+{
+    const QString table = html.section(QStringLiteral("<td class='L%1'>").arg(line), 1, 1).section("</table>", 0, 0);
+    static const QRegularExpression cell("<td[^>]*>(.*?)</td>");
+    QStringList cells;
+    for (auto it = cell.globalMatch(table); it.hasNext();) {
+        QString c = it.next().captured(1);
+        c.replace("&nbsp;", " ").replace("&lt;", "<").replace("&gt;", ">").replace("&#39;", "'").replace("&amp;", "&");
+        cells << c;
+    }
+    if (cells.size() == 1 && table.contains("<td nowrap>"))
+        return "text:" + cells.first();
+    const QString mirror = "()<>[]{}";
+    QString shown;
+    for (const QString& c : cells) {
+        const int m = c.size() == 1 ? int(mirror.indexOf(c)) : -1;
+        shown.prepend(m < 0 ? c : QString(mirror[m ^ 1]));
+    }
+    return "cells:" + shown;
+}
+
 LabelLineDef textLine(short field, const QString& column, const QString& prefix = {}, bool price = false)
 {
     LabelLineDef l;
@@ -215,6 +243,36 @@ private slots:
                                               + cells + "</tr></table>");
     }
 
+    // The name line as the item import stores it for each connection type
+    // reads as the name: type 1 keeps the ERP's display order, type 2 the
+    // logical order, which the browser must lay out itself.
+    void nameLineReads_data()
+    {
+        QTest::addColumn<int>("connType");
+        QTest::addColumn<QString>("erpText");
+        QTest::addColumn<QString>("shown");
+        QTest::newRow("type 1, Latin") << 1 << "Makita DHP482 (18V)" << "cells:Makita DHP482 (18V)";
+        QTest::newRow("type 1, Hebrew") << 1 << "החדקמ" << "cells:החדקמ";
+        QTest::newRow("type 1, mixed") << 1 << "(Makita 18V) החדקמ" << "cells:(Makita 18V) החדקמ";
+        QTest::newRow("type 2, Latin") << 2 << "Makita DHP482 (18V)" << "text:Makita DHP482 (18V)";
+        QTest::newRow("type 2, Hebrew") << 2 << "מקדחה" << "text:מקדחה";
+        QTest::newRow("type 2, mixed") << 2 << "מקדחה (Makita 18V) <2>" << "text:מקדחה (Makita 18V) <2>";
+    }
+    void nameLineReads()
+    {
+        QFETCH(int, connType);
+        QFETCH(QString, erpText);
+        QFETCH(QString, shown);
+        LabelData data(QStringLiteral("UPDATE tItems SET VNItemName = '%1' WHERE ItemKey = 'A1'")
+                           .arg(ReverseForCells(erpText, short(connType)).replace("'", "''")));
+        DirectLabelLayout layout;
+        layout.lines[2] = textLine(16, "VNItemName");
+        setErpConnType(short(connType));
+        const QString html = page(data, layout, " And ItemKey = 'A1'");
+        setErpConnType(1);
+        QCOMPARE(nameLine(html, 2), shown);
+    }
+
     void codePage()
     {
         LabelData data("UPDATE tItems SET ItemName = 'שלום ش €' WHERE ItemKey = 'A1'");
@@ -245,9 +303,43 @@ private slots:
         QVERIFY(!QFile::exists(folder + "/B0400003.BMP")); // no barcode at all
         QCOMPARE(refused.size(), 1);
         QCOMPARE(refused.first().record, 2);
+        QCOMPARE(refused.first().labels, 1); // A2's copies
         // The folder is emptied for the next job.
         QVERIFY(PrepareJobFolder(folder).isEmpty());
         QVERIFY(QDir(folder).entryList(QDir::Files).isEmpty());
+    }
+
+    // The attention message counts labels on the page, not records: a record
+    // with copies is several labels, one refused on two lines is still its
+    // labels once, and one with no copies is not on the page.
+    void refusalMessage_data()
+    {
+        QTest::addColumn<Refused>("refused");
+        QTest::addColumn<int>("onPage");
+        QTest::addColumn<QString>("head");
+        QTest::addColumn<int>("listed");
+        using R = Refused;
+        QTest::newRow("copies count") << R{{2, 3}, {5, 1}} << 9 << "4 מתוך 9 המדבקות שבדף יודפסו בלי ברקוד" << 2;
+        QTest::newRow("two lines, one record") << R{{2, 3}, {2, 3}} << 9 << "3 מתוך 9 המדבקות" << 2;
+        QTest::newRow("not on the page") << R{{3, 0}} << 9 << "" << 0;
+    }
+    void refusalMessage()
+    {
+        QFETCH(Refused, refused);
+        QFETCH(int, onPage);
+        QFETCH(QString, head);
+        QFETCH(int, listed);
+        QVector<BarcodeRefusal> list;
+        for (const auto& [record, labels] : refused)
+            list.push_back({record, labels, "12", QStringLiteral("ברקוד EAN-13 לערך \"12\": אורך שגוי")});
+        const QString message = BarcodeRefusalMessage(list, onPage);
+        if (head.isEmpty()) {
+            QVERIFY(message.isEmpty());
+            return;
+        }
+        const QStringList lines = message.split('\n');
+        QVERIFY2(lines.first().startsWith(head), qPrintable(lines.first()));
+        QCOMPARE(lines.size() - 1, listed);
     }
 
     void layoutInSettings()
@@ -305,6 +397,83 @@ private slots:
         QCOMPARE(f.prompt->criticalCount(), 1);
         directLabelLayout() = DirectLabelLayout{};
         qunsetenv("Temp");
+    }
+
+    // A job with a value its barcode cannot carry: the page opens, then the
+    // message counts that record's labels against the page's, in Hebrew.
+    void printButtonReportsRefusals()
+    {
+        LabelData data("UPDATE tItems SET BarCode = '729000000001X', Copies = 4 WHERE ItemKey = 'A2'");
+        const QString temp = work.filePath("temp-refused");
+        qputenv("Temp", temp.toUtf8());
+        CardFixture f(QStringLiteral("[GeneralParams]\nDBPath=%1\nOptOLE3=True\nOptOLE0=False\n"
+                                     "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n"
+                                     "[LabelBar]\nBarType=6\n").arg(data.folder).toUtf8());
+        f.card->control<QPushButton>("cmdPrintItmes")->click();
+        qunsetenv("Temp");
+        directLabelLayout() = DirectLabelLayout{};
+        QCOMPARE(f.pages->shown.size(), 1);
+        QCOMPARE(f.prompt->criticalCount(), 0);
+        QCOMPARE(f.prompt->lines().size(), 1);
+        const QString shown = f.prompt->lines().first();
+        // A1 2, A2 4 and B1 3 copies: nine labels, A2's four without their barcode.
+        QVERIFY2(shown.startsWith(QString::fromUtf8("שימו לב: 4 מתוך 9 המדבקות שבדף")), qPrintable(shown));
+        QVERIFY2(shown.contains("729000000001X") && shown.contains("EAN-13"), qPrintable(shown));
+        QVERIFY2(!shown.contains(QRegularExpression("Error|Invalid|digits")), qPrintable(shown));
+    }
+
+    // A page that fails after its head leaves nothing of itself behind; an
+    // earlier page at that name stays as it was.
+    void failedPageLeavesNothing_data()
+    {
+        QTest::addColumn<QString>("db");
+        QTest::addColumn<QString>("sql");
+        QTest::newRow("no database") << "missing.tmp" << "SELECT 1 AS Copies";
+        QTest::newRow("query fails") << "" << "SELECT NoSuchColumn FROM tItems";
+    }
+    void failedPageLeavesNothing()
+    {
+        QFETCH(QString, db);
+        QFETCH(QString, sql);
+        LabelData data;
+        QTemporaryDir out;
+        const QString file = out.filePath("tgrlab1.htm");
+        QFile earlier(file);
+        QVERIFY(earlier.open(QIODevice::WriteOnly));
+        earlier.write("earlier page");
+        earlier.close();
+        DirectLabelLayout layout;
+        layout.lines[0] = textLine(0, "ItemKey");
+        const QString error
+            = CreateLabPage(file, db.isEmpty() ? data.docs : out.filePath(db), sql, layout, "0.00", nullptr);
+        QVERIFY(!error.isEmpty());
+        QCOMPARE(QDir(out.path()).entryList(QDir::Files | QDir::Hidden), QStringList{"tgrlab1.htm"});
+        QVERIFY(earlier.open(QIODevice::ReadOnly));
+        QCOMPARE(earlier.readAll(), QByteArray("earlier page"));
+    }
+
+    // A host calling the method reads the outcome; the user sees the failure.
+    void createLabFileTellsHost_data()
+    {
+        QTest::addColumn<bool>("goodDatabase");
+        QTest::newRow("written") << true;
+        QTest::newRow("failed") << false;
+    }
+    void createLabFileTellsHost()
+    {
+        QFETCH(bool, goodDatabase);
+        LabelData data;
+        CardFixture f;
+        directLabelLayout().lines[0] = textLine(0, "ItemKey");
+        const QString file = work.filePath(QStringLiteral("host%1.htm").arg(goodDatabase));
+        bool result = !goodDatabase;
+        QVERIFY(QMetaObject::invokeMethod(f.card.get(), "CreateLabFile", Q_RETURN_ARG(bool, result), Q_ARG(QString, file),
+                                          Q_ARG(QString, goodDatabase ? data.docs : data.folder + "/missing.tmp"),
+                                          Q_ARG(uchar, 1), Q_ARG(uchar, 1)));
+        directLabelLayout() = DirectLabelLayout{};
+        QCOMPARE(result, goodDatabase);
+        QCOMPARE(f.prompt->criticalCount(), goodDatabase ? 0 : 1);
+        QCOMPARE(QFile::exists(file), goodDatabase);
     }
 };
 

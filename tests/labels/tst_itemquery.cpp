@@ -131,6 +131,30 @@ private slots:
         QCOMPARE(rows(data.docs, "SELECT CompName, EX1, EX5 FROM (" + BuildItemQuery(s, 1, 1) + ") WHERE ItemKey = 'A1'"),
                  QStringList{"Acme Tools Ltds|A1-pc|10"});
     }
+
+    // A ticked expression row with nothing to compute has no column, and the
+    // query still runs.
+    void blankExpressionHasNoColumn_data()
+    {
+        QTest::addColumn<QString>("expression");
+        QTest::newRow("empty") << "";
+        QTest::newRow("blanks") << "   ";
+    }
+    void blankExpressionHasNoColumn()
+    {
+        QFETCH(QString, expression);
+        LabelQuerySettings s = sending({33, 34});
+        s.expressions[33] = expression;
+        s.expressions[34] = "Unit";
+        for (int type : {1, 2}) {
+            const QStringList columns = columnsOf(data.docs, BuildItemQuery(s, type, 1));
+            QCOMPARE(columns.mid(columns.size() - 1), QStringList{"EX2"});
+            QVERIFY(!columns.contains("EX1"));
+            QVERIFY(!rows(data.docs, "SELECT EX2 FROM (" + BuildItemQuery(s, type, 1) + ")").isEmpty());
+        }
+        QVERIFY(!RowIsSent(s, 33));
+        QVERIFY(RowIsSent(s, 34));
+    }
 };
 
 QTEST_GUILESS_MAIN(TestItemQuery)

@@ -232,6 +232,41 @@ private slots:
         QVERIFY(o.journal.at(o.journal.size() - 2).endsWith("LabelPrint()"));
     }
 
+    // Opening another file drops what FastLabel collected: each file's records
+    // are printed before the next file opens, with or without header labels.
+    void fastLabelPrintsBeforeEachFile_data()
+    {
+        QTest::addColumn<bool>("header");
+        QTest::addColumn<QStringList>("events");
+        QTest::newRow("record labels") << false << QStringList{
+            "open /l/own.lbl", "qty 4", "print", "open /l/long.lbl", "qty 1", "print", "open /l/a.lbl", "qty 2", "print"};
+        QTest::newRow("with header labels") << true << QStringList{
+            "open /l/head.lbl", "qty 1", "print", "open /l/own.lbl", "qty 4", "print", "open /l/long.lbl", "qty 1",
+            "print", "open /l/head.lbl", "qty 1", "print", "open /l/a.lbl", "qty 2", "print"};
+    }
+    void fastLabelPrintsBeforeEachFile()
+    {
+        QFETCH(bool, header);
+        QFETCH(QStringList, events);
+        LabelData data("UPDATE tAccountDef SET LabelName = '/l/own.lbl', FldID = 2, FldMaxLen = 13,"
+                       " Label2Name = '/l/long.lbl'");
+        LabelRunRequest r = request(data, 7, 2, {});
+        r.printHeader = header;
+        r.headerLabel = "/l/head.lbl";
+        const Outcome o = run(r);
+        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
+        QStringList seen;
+        for (const QString& l : o.journal) {
+            if (l.contains(".LabelOpen("))
+                seen << "open " + l.section('"', 1, 1);
+            else if (l.contains(".LabelQty = "))
+                seen << "qty " + l.section(" = ", 1);
+            else if (l.endsWith(".LabelPrint()"))
+                seen << "print";
+        }
+        QCOMPARE(seen, events);
+    }
+
     void nullSentAsEmptyText()
     {
         LabelData data;
@@ -331,6 +366,25 @@ private slots:
         for (const QString& l : readJournal(journal).filter("\"ItemKey\""))
             sent << l.section('"', 3, 3);
         QCOMPARE(sent, keys);
+    }
+
+    // A ticked expression row left blank is neither asked of the query nor sent.
+    void blankExpressionRowIsNotSent()
+    {
+        LabelData data;
+        const QString journal = work.filePath(QStringLiteral("blank%1.txt").arg(++runs));
+        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n").arg(journal, data.folder).toUtf8());
+        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
+        f.c<QCheckBox>("ChkFldSend(33)")->setChecked(true);
+        f.c<QLineEdit>("txtFldExpr(33)")->setText(" ");
+        f.c<QCheckBox>("ChkFldSend(34)")->setChecked(true);
+        f.c<QLineEdit>("txtFldExpr(34)")->setText("tItems.Unit");
+        f.c<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
+        QCOMPARE(f.card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        const QStringList lines = readJournal(journal);
+        QVERIFY(lines.filter("\"EX1\"").isEmpty());
+        QCOMPARE(lines.filter("\"EX2\", \"pc\"").size(), 3);
     }
 };
 
