@@ -518,7 +518,7 @@ const std::vector<TableDef>& itemsTables()
         alterKeys("tAlterKeys"),
         alterPrices("tAlterPrices"),
         {"tAccountDef",
-         {{"DefID", T::Long}, {"AccountKey", T::Text, 20}, {"PriceList", T::Integer}, {"LabelName", T::Text, 50},
+         {{"DefID", T::Long}, {"AccountKey", T::Text, 20}, {"PriceList", T::Long}, {"LabelName", T::Text, 50},
           {"Include", T::Boolean}},
          {"DefID"},
          true},
