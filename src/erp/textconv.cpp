@@ -35,15 +35,6 @@ QChar mirrorBracket(QChar c)
     }
 }
 
-QChar mirrorChar(QChar c)
-{
-    switch (c.unicode()) {
-    case '<': return QLatin1Char('>');
-    case '>': return QLatin1Char('<');
-    default: return mirrorBracket(c);
-    }
-}
-
 bool isNullish(const QVariant& v)
 {
     return !v.isValid() || v.isNull();
@@ -79,6 +70,15 @@ std::optional<QDateTime> asDateTime(const QVariant& v)
     }
 }
 } // namespace
+
+QChar MirrorChar(QChar c)
+{
+    switch (c.unicode()) {
+    case '<': return QLatin1Char('>');
+    case '>': return QLatin1Char('<');
+    default: return mirrorBracket(c);
+    }
+}
 
 short erpConnType()
 {
@@ -130,7 +130,7 @@ QString ReverseForCells(const QString& text, short connType)
     out.reserve(text.size() * 2 + 1);
     for (int i = text.size() - 1; i >= 0; --i) {
         out += kCellSeparator;
-        out += mirrorChar(text[i]);
+        out += MirrorChar(text[i]);
     }
     out += kCellSeparator;
     if (connType == 2)

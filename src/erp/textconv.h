@@ -27,6 +27,9 @@ QString VisualToLogical(const QString& text);
 // for type 2 the result is turned back so the characters keep their order.
 QString ReverseForCells(const QString& text, short connType);
 QString ReverseForCells(const QString& text);
+// The character as the cell form writes it: brackets and angle brackets turned
+// around. Applying it twice gives the character back.
+QChar MirrorChar(QChar c);
 
 bool HasHebrewLetters(const QString& text);
 

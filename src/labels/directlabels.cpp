@@ -117,22 +117,6 @@ QString nameTableOpen(const QString& className)
     return out + QStringLiteral(" cellspacing='0' cellpadding='0' border='0' align='right' dir='rtl'><tr>");
 }
 
-// The cell form turns brackets around for the browser; this turns them back.
-QChar unmirrored(QChar c)
-{
-    switch (c.unicode()) {
-    case '(': return QLatin1Char(')');
-    case ')': return QLatin1Char('(');
-    case '[': return QLatin1Char(']');
-    case ']': return QLatin1Char('[');
-    case '{': return QLatin1Char('}');
-    case '}': return QLatin1Char('{');
-    case '<': return QLatin1Char('>');
-    case '>': return QLatin1Char('<');
-    default: return c;
-    }
-}
-
 // A connection of type 2 keeps the cell form in the text's own (logical)
 // order. Cells from right to left would show it backwards, so it goes back to
 // plain text, which the browser lays out as it reads. A value that is not in
@@ -145,7 +129,7 @@ QString logicalFromCells(const QString& value)
     text.reserve(value.size() / 2);
     for (const QChar c : value)
         if (c != kCellSeparator)
-            text += unmirrored(c);
+            text += MirrorChar(c); // the cell form turned brackets around
     return text;
 }
 
