@@ -351,10 +351,6 @@ private slots:
         QTemporaryDir d;
         IniSettingsStore store(d.filePath("s.ini"));
         DirectLabelLayout layout;
-        SetGetLabelDefs(2, layout, store);
-        QCOMPARE(layout.page.PageRows, short(6));
-        QCOMPARE(layout.bar.UserResoX, short(100));
-        QVERIFY(layout.bar.CheckDigit);
         layout.lines[4] = textLine(31, "SalPackUN", "יח'");
         layout.bar.DimX = 0.02f;
         SetGetLabelDefs(1, layout, store);
