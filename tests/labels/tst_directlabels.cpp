@@ -221,12 +221,9 @@ private slots:
     {
         DirectLabelLayout layout;
         layout.lines[2] = textLine(1, "ItemName");
-        layout.lines[2].Font = 1;
-        layout.lines[2].FontWeight = 2;
         layout.lines[2].FontSize = 12;
         layout.lines[2].FontItalic = true;
         layout.lines[2].FontUL = true;
-        layout.lines[2].Align = 0;
         layout.lines[2].Direction = 0;
         layout.lines[2].Height = 14;
         layout.lines[2].Border = true;
