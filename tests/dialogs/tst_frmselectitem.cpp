@@ -66,9 +66,6 @@ private slots:
         c<QLineEdit>(f, "txtItemsNum")->setText("2");
         c<QPushButton>(f, "cmdShowAll")->click();
         QCOMPARE(keys(f), QStringList({"A", "B"}));
-        // Not a number: the usual page.
-        c<QLineEdit>(f, "txtItemsNum")->setText("abc");
-        QVERIFY(f.BuildSelectItemsQuery({}, false, 0, 0).endsWith(" LIMIT 500"));
     }
 
     void findByKey_data()
@@ -115,6 +112,9 @@ private slots:
         fill("WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < 2000)"
              " INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) SELECT printf('I%04d', i), 'x', 1, 0 FROM n");
         FrmSelectItem f(folder, QString(), nullptr);
+        // A page size that is not a number gives the usual page.
+        c<QLineEdit>(f, "txtItemsNum")->setText("abc");
+        c<QPushButton>(f, "cmdShowAll")->click();
         QCOMPARE(f.model()->rowCount(), 500);
         c<QPushButton>(f, "CmdAllItems")->click();
         QCOMPARE(rows(items, "SELECT count(*), min(ItemKey), max(ItemKey) FROM tItems WHERE PrintLabel = 1"),

@@ -33,24 +33,6 @@ class TestItemQuery : public QObject {
     LabelData data;
 
 private slots:
-    void fixedColumns_data()
-    {
-        QTest::addColumn<int>("type");
-        QTest::addColumn<QStringList>("tail");
-        QTest::newRow("by items") << 1 << QStringList{"Copies", "AccountKey"};
-        QTest::newRow("by documents") << 2 << QStringList{"WizFileID", "Number", "Copies", "AccountKey"};
-    }
-    void fixedColumns()
-    {
-        QFETCH(int, type);
-        QFETCH(QStringList, tail);
-        const QStringList fixed = {"ItemKey", "ItemName", "ItemSort", "FName", "BarCode", "Local", "Unit", "Price",
-                                   "Coin", "CoinSign", "VNItemName", "PackStart", "Volume", "Weight", "SalPackUN"};
-        // Columns are looked up without regard to case, as the engine may spell them as declared.
-        QCOMPARE(columnsOf(data.docs, BuildItemQuery(LabelQuerySettings{}, type, 1)).join(',').toLower(),
-                 (fixed + tail).join(',').toLower());
-    }
-
     // What each account-dependent column holds, by items, with and without an account.
     void accountColumns_data()
     {

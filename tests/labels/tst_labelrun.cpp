@@ -172,85 +172,38 @@ private slots:
         QVERIFY(lines[4].startsWith("NiceLabel.Application.LabelSetVar(4, "));
     }
 
-    // Per-account labels, with the second label for long values, by documents.
-    void accountLabels_data()
+    // Which file each record is printed with, by documents: the account's own
+    // label (the second one for a long value), the header label before each
+    // document. FastLabel prints what it collected before it opens another file.
+    void labelFiles_data()
     {
+        QTest::addColumn<int>("code");
         QTest::addColumn<int>("fieldId");
-        QTest::addColumn<QStringList>("opened");
-        QTest::newRow("second label by barcode length") << 2 << QStringList{"/l/own.lbl", "/l/long.lbl", kLabel};
-        QTest::newRow("no field: always the account's") << 0 << QStringList{"/l/own.lbl", kLabel};
-    }
-    void accountLabels()
-    {
-        QFETCH(int, fieldId);
-        QFETCH(QStringList, opened);
-        LabelData data(QStringLiteral("UPDATE tAccountDef SET LabelName = '/l/own.lbl', FldID = %1, FldMaxLen = 13,"
-                                      " Label2Name = '/l/long.lbl'").arg(fieldId));
-        const Outcome o = run(request(data, 5, 2, {}));
-        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
-        QStringList opens, closes;
-        for (const QString& l : o.journal) {
-            if (l.contains(".LabelOpen("))
-                opens << l.section('"', 1, 1);
-            if (l.contains(".LabelClose("))
-                closes << l;
-        }
-        QCOMPARE(opens, opened);
-        // Each change of file closes the old one first; the last is closed at the end.
-        QCOMPARE(closes.size(), opened.size());
-        QVERIFY(o.journal.indexOf(QRegularExpression(".*LabelClose.*")) < o.journal.lastIndexOf(QRegularExpression(".*LabelOpen.*")));
-    }
-
-    void headerLabelPerDocument()
-    {
-        LabelData data;
-        LabelRunRequest r = request(data, 5, 2, {});
-        r.printHeader = true;
-        r.headerLabel = "/l/head.lbl";
-        const Outcome o = run(r);
-        QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
-        QStringList events;
-        for (const QString& l : o.journal) {
-            if (l.contains("LabelOpen("))
-                events << "open " + l.section('"', 1, 1);
-            else if (l.contains("LabelPrint("))
-                events << "print " + l.section('"', 1, 1);
-        }
-        QCOMPARE(events, QStringList({"open /l/head.lbl", "print 1,0", "open /l/a.lbl", "print 4,0", "print 1,0",
-                                      "open /l/head.lbl", "print 1,0", "open /l/a.lbl", "print 2,0"}));
-    }
-
-    // FastLabel collects the records of a file and prints them once.
-    void fastLabelCollects()
-    {
-        LabelData data;
-        const Outcome o = run(request(data, 7, 1, {}));
-        QCOMPARE(o.journal.filter("LabelOpen(").size(), 1);
-        QCOMPARE(o.journal.filter("AddRecord(").size(), 2);
-        QCOMPARE(o.journal.filter("LabelQty = ").size(), 3);
-        QCOMPARE(o.journal.filter("LabelPrint(").size(), 1);
-        QVERIFY(o.journal.at(o.journal.size() - 2).endsWith("LabelPrint()"));
-    }
-
-    // Opening another file drops what FastLabel collected: each file's records
-    // are printed before the next file opens, with or without header labels.
-    void fastLabelPrintsBeforeEachFile_data()
-    {
         QTest::addColumn<bool>("header");
         QTest::addColumn<QStringList>("events");
-        QTest::newRow("record labels") << false << QStringList{
+        QTest::newRow("second label by barcode length") << 5 << 2 << false << QStringList{
+            "open /l/own.lbl", "print 4", "close", "open /l/long.lbl", "print 1", "close", "open /l/a.lbl", "print 2", "close"};
+        QTest::newRow("no field: always the account's") << 5 << 0 << false << QStringList{
+            "open /l/own.lbl", "print 4", "print 1", "close", "open /l/a.lbl", "print 2", "close"};
+        QTest::newRow("header label per document") << 5 << -1 << true << QStringList{
+            "open /l/head.lbl", "print 1", "close", "open /l/a.lbl", "print 4", "print 1", "close", "open /l/head.lbl",
+            "print 1", "close", "open /l/a.lbl", "print 2", "close"};
+        QTest::newRow("FastLabel, record labels") << 7 << 2 << false << QStringList{
             "open /l/own.lbl", "qty 4", "print", "open /l/long.lbl", "qty 1", "print", "open /l/a.lbl", "qty 2", "print"};
-        QTest::newRow("with header labels") << true << QStringList{
+        QTest::newRow("FastLabel, with header labels") << 7 << 2 << true << QStringList{
             "open /l/head.lbl", "qty 1", "print", "open /l/own.lbl", "qty 4", "print", "open /l/long.lbl", "qty 1",
             "print", "open /l/head.lbl", "qty 1", "print", "open /l/a.lbl", "qty 2", "print"};
     }
-    void fastLabelPrintsBeforeEachFile()
+    void labelFiles()
     {
+        QFETCH(int, code);
+        QFETCH(int, fieldId);
         QFETCH(bool, header);
         QFETCH(QStringList, events);
-        LabelData data("UPDATE tAccountDef SET LabelName = '/l/own.lbl', FldID = 2, FldMaxLen = 13,"
-                       " Label2Name = '/l/long.lbl'");
-        LabelRunRequest r = request(data, 7, 2, {});
+        LabelData data(fieldId < 0 ? QString()
+                                   : QStringLiteral("UPDATE tAccountDef SET LabelName = '/l/own.lbl', FldID = %1,"
+                                                    " FldMaxLen = 13, Label2Name = '/l/long.lbl'").arg(fieldId));
+        LabelRunRequest r = request(data, code, 2, {});
         r.printHeader = header;
         r.headerLabel = "/l/head.lbl";
         const Outcome o = run(r);
@@ -259,10 +212,14 @@ private slots:
         for (const QString& l : o.journal) {
             if (l.contains(".LabelOpen("))
                 seen << "open " + l.section('"', 1, 1);
-            else if (l.contains(".LabelQty = "))
-                seen << "qty " + l.section(" = ", 1);
             else if (l.endsWith(".LabelPrint()"))
                 seen << "print";
+            else if (l.contains(".LabelPrint("))
+                seen << "print " + l.section('"', 1, 1).section(',', 0, 0);
+            else if (l.contains(".LabelClose("))
+                seen << "close";
+            else if (l.contains(".LabelQty = "))
+                seen << "qty " + l.section(" = ", 1);
         }
         QCOMPARE(seen, events);
     }
@@ -329,17 +286,6 @@ private slots:
         QCOMPARE(int(o.result.status), int(LabelRunResult::Status::Done));
         QCOMPARE(o.journal.filter("LabelQty = ").size(), 32800);
         QVERIFY(o.journal.contains("FastLabel.FastLabelX.LabelSetVar(\"ItemKey\", \"Z32800\")"));
-    }
-
-    void waitCountsSecondBoundaries()
-    {
-        QElapsedTimer t;
-        t.start();
-        WaitSeconds(1);
-        const qint64 ms = t.elapsed();
-        // One boundary passed: somewhere within the next second, never more than one.
-        QVERIFY(ms <= 1100);
-        WaitSeconds(0);
     }
 
     // The print button, with the order of the printer type.
