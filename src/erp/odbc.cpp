@@ -195,9 +195,15 @@ QString dayOf(const QString& column)
 {
     return QStringLiteral("date(") + column + QLatin1Char(')');
 }
+
+bool isDateValue(const QVariant& v)
+{
+    const int type = v.typeId();
+    return type == QMetaType::QDate || type == QMetaType::QDateTime;
+}
 } // namespace
 
-QString ErpConnection::rewriteForSqlite(const QString& sql)
+QString ErpConnection::rewriteForSqlite(const QString& sql, const ErpParams& params)
 {
     static const QRegularExpression dateLiteral(QStringLiteral("^#(\\d{1,2})/(\\d{1,2})/(\\d{4})#"));
     // END closes a CASE expression; it names no column.
@@ -207,7 +213,25 @@ QString ErpConnection::rewriteForSqlite(const QString& sql)
                                                 + QStringLiteral(")(?![\\w.\"]|\\s*\\()"));
     QString out;
     out.reserve(sql.size());
+    // A day in place of sql[i]: the column compared with it, before or after,
+    // is taken to its day too.
+    auto day = [&](const QString& value, int& i) {
+        // The column sits just before the day: a look at the tail is enough.
+        const auto before = columnBefore.match(out, std::max<qsizetype>(0, out.size() - 256));
+        if (before.hasMatch()) {
+            out.truncate(before.capturedStart());
+            out += dayOf(before.captured(1)) + before.captured(2) + value;
+            return;
+        }
+        const auto after = columnAfter.match(QStringView(sql).mid(i + 1));
+        out += value;
+        if (after.hasMatch()) {
+            out += after.captured(1) + dayOf(after.captured(2));
+            i += int(after.capturedLength());
+        }
+    };
     bool quoted = false;
+    int marker = 0;
     for (int i = 0; i < sql.size(); ++i) {
         const QChar c = sql[i];
         if (quoted) {
@@ -225,25 +249,20 @@ QString ErpConnection::rewriteForSqlite(const QString& sql)
         if ((c == QLatin1Char('N') || c == QLatin1Char('n')) && wordStart && i + 1 < sql.size()
             && sql[i + 1] == QLatin1Char('\''))
             continue; // N'text' is 'text'
+        if (c == QLatin1Char('?')) {
+            if (marker < params.size() && isDateValue(params[marker]))
+                day(QStringLiteral("?"), i);
+            else
+                out += c;
+            ++marker;
+            continue;
+        }
         if (c == QLatin1Char('#')) {
             const auto m = dateLiteral.match(QStringView(sql).mid(i));
             if (m.hasMatch()) {
                 const QDate d(m.captured(3).toInt(), m.captured(2).toInt(), m.captured(1).toInt());
-                const QString day = QLatin1Char('\'') + d.toString(Qt::ISODate) + QLatin1Char('\'');
                 i += int(m.capturedLength()) - 1;
-                // The column sits just before the literal: a look at the tail is enough.
-                const auto before = columnBefore.match(out, std::max<qsizetype>(0, out.size() - 256));
-                if (before.hasMatch()) {
-                    out.truncate(before.capturedStart());
-                    out += dayOf(before.captured(1)) + before.captured(2) + day;
-                    continue;
-                }
-                const auto after = columnAfter.match(QStringView(sql).mid(i + 1));
-                out += day;
-                if (after.hasMatch()) {
-                    out += after.captured(1) + dayOf(after.captured(2));
-                    i += int(after.capturedLength());
-                }
+                day(QLatin1Char('\'') + d.toString(Qt::ISODate) + QLatin1Char('\''), i);
                 continue;
             }
         }
@@ -252,12 +271,95 @@ QString ErpConnection::rewriteForSqlite(const QString& sql)
     return out;
 }
 
-QString ErpConnection::dialectSql(const QString& sql) const
+QString ErpConnection::dialectSql(const QString& sql, const ErpParams& params) const
 {
-    return isSqlite() ? rewriteForSqlite(sql) : sql;
+    return isSqlite() ? rewriteForSqlite(sql, params) : sql;
 }
 
-std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, QString* error)
+namespace {
+// One value for a "?" marker, held where the driver reads it at execution.
+struct BoundValue {
+    std::u16string text;
+    SQLINTEGER whole = 0;
+    SQLBIGINT wide = 0;
+    double real = 0;
+    SQL_DATE_STRUCT date{};
+    SQL_TIMESTAMP_STRUCT stamp{};
+    SQLLEN indicator = 0;
+};
+
+// Binds every value to its marker; the values must stay where they are until
+// the statement has run. SQLite keeps dates as text, so there a date goes out
+// as the day's text, to meet the day the dialect takes the column to.
+bool bindParams(SQLHSTMT stmt, const ErpParams& params, bool sqlite, std::vector<BoundValue>& bound, QString* error)
+{
+    bound.assign(size_t(params.size()), BoundValue());
+    for (qsizetype n = 0; n < params.size(); ++n) {
+        const QVariant& v = params[n];
+        BoundValue& b = bound[size_t(n)];
+        const SQLUSMALLINT marker = SQLUSMALLINT(n + 1);
+        SQLRETURN rc = SQL_ERROR;
+        const int type = v.typeId();
+        auto bindText = [&](const QString& text) {
+            b.text = wide(text);
+            b.indicator = SQLLEN(b.text.size() * sizeof(char16_t));
+            // A column size of 0 is refused by some drivers, even for empty text.
+            const SQLULEN chars = std::max<SQLULEN>(1, b.text.size());
+            return SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_WCHAR,
+                                    chars > 4000 ? SQL_WLONGVARCHAR : SQL_WVARCHAR, chars, 0, wptr(b.text),
+                                    b.indicator, &b.indicator);
+        };
+        if (v.isNull()) {
+            b.indicator = SQL_NULL_DATA;
+            rc = SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_WCHAR, SQL_WVARCHAR, 1, 0, nullptr, 0,
+                                  &b.indicator);
+        } else if (type == QMetaType::QString) {
+            rc = bindText(v.toString());
+        } else if (type == QMetaType::Int || type == QMetaType::Short || type == QMetaType::UShort
+                   || type == QMetaType::Char || type == QMetaType::SChar || type == QMetaType::UChar
+                   || type == QMetaType::Bool) {
+            b.whole = SQLINTEGER(v.toInt());
+            rc = SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_SLONG, SQL_INTEGER, 0, 0, &b.whole, 0, nullptr);
+        } else if (type == QMetaType::UInt || type == QMetaType::LongLong || type == QMetaType::ULongLong
+                   || type == QMetaType::Long || type == QMetaType::ULong) {
+            b.wide = SQLBIGINT(v.toLongLong());
+            rc = SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_SBIGINT, SQL_BIGINT, 0, 0, &b.wide, 0, nullptr);
+        } else if (type == QMetaType::Double || type == QMetaType::Float) {
+            b.real = v.toDouble();
+            rc = SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_DOUBLE, SQL_DOUBLE, 0, 0, &b.real, 0, nullptr);
+        } else if (isDateValue(v) && sqlite) {
+            const QDate d = type == QMetaType::QDate ? v.toDate() : v.toDateTime().date();
+            rc = bindText(d.toString(Qt::ISODate));
+        } else if (type == QMetaType::QDate) {
+            const QDate d = v.toDate();
+            b.date = {SQLSMALLINT(d.year()), SQLUSMALLINT(d.month()), SQLUSMALLINT(d.day())};
+            rc = SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_TYPE_DATE, SQL_TYPE_DATE, 10, 0, &b.date, 0,
+                                  nullptr);
+        } else if (type == QMetaType::QDateTime) {
+            const QDateTime t = v.toDateTime();
+            b.stamp = {SQLSMALLINT(t.date().year()), SQLUSMALLINT(t.date().month()), SQLUSMALLINT(t.date().day()),
+                       SQLUSMALLINT(t.time().hour()), SQLUSMALLINT(t.time().minute()), SQLUSMALLINT(t.time().second()),
+                       0};
+            rc = SQLBindParameter(stmt, marker, SQL_PARAM_INPUT, SQL_C_TYPE_TIMESTAMP, SQL_TYPE_TIMESTAMP, 19, 0,
+                                  &b.stamp, 0, nullptr);
+        } else {
+            if (error)
+                *error = QStringLiteral("value %1 of the query has a kind the ERP query cannot take (%2)")
+                             .arg(n + 1)
+                             .arg(QLatin1String(v.typeName()));
+            return false;
+        }
+        if (!SQL_SUCCEEDED(rc)) {
+            if (error)
+                *error = diagnostics(SQL_HANDLE_STMT, stmt);
+            return false;
+        }
+    }
+    return true;
+}
+} // namespace
+
+std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, const ErpParams& params, QString* error)
 {
     if (!m_h->connected) {
         if (error)
@@ -282,7 +384,12 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, QString* 
     SQLSetStmtAttr(stmt, SQL_ATTR_CURSOR_TYPE, reinterpret_cast<SQLPOINTER>(SQL_CURSOR_FORWARD_ONLY), 0);
     SQLSetStmtAttr(stmt, SQL_ATTR_CONCURRENCY, reinterpret_cast<SQLPOINTER>(SQL_CONCUR_READ_ONLY), 0);
     SQLSetStmtAttr(stmt, SQL_ATTR_QUERY_TIMEOUT, reinterpret_cast<SQLPOINTER>(static_cast<SQLULEN>(m_timeout)), 0);
-    std::u16string text = wide(dialectSql(sql));
+    std::vector<BoundValue> bound;
+    if (!bindParams(stmt, params, isSqlite(), bound, error)) {
+        SQLFreeHandle(SQL_HANDLE_STMT, stmt);
+        return nullptr;
+    }
+    std::u16string text = wide(dialectSql(sql, params));
     const SQLRETURN rc = SQLExecDirectW(stmt, wptr(text), SQLINTEGER(text.size()));
     if (!SQL_SUCCEEDED(rc) && rc != SQL_NO_DATA) {
         if (error)
@@ -290,6 +397,8 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, QString* 
         SQLFreeHandle(SQL_HANDLE_STMT, stmt);
         return nullptr;
     }
+    // The values die with this call; the driver has taken them by now.
+    SQLFreeStmt(stmt, SQL_RESET_PARAMS);
     std::unique_ptr<ErpRecordset> rs(new ErpRecordset(stmt));
     if (!rs->describe()) {
         if (error)
@@ -301,10 +410,10 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, QString* 
     return rs;
 }
 
-long long ErpConnection::countRows(const QString& sql, QString* error)
+long long ErpConnection::countRows(const QString& sql, const ErpParams& params, QString* error)
 {
     QString e;
-    auto rs = query(QStringLiteral("SELECT COUNT(*) FROM (%1) TagoraCount").arg(withoutOrderBy(sql)), &e);
+    auto rs = query(QStringLiteral("SELECT COUNT(*) FROM (%1) TagoraCount").arg(withoutOrderBy(sql)), params, &e);
     if (!rs || !rs->next()) {
         if (error)
             *error = rs ? rs->error() : e;

@@ -14,6 +14,18 @@ namespace tagora {
 // driver's own message.
 class ErpRecordset;
 
+// The values a query's "?" markers stand for, in order: text (sent as wide
+// characters, so Hebrew arrives as written), whole numbers, decimals, dates.
+// A value sent this way never becomes part of the SQL text, so no server's
+// quoting rules (a backslash that escapes, say) can make it end a literal.
+using ErpParams = QVariantList;
+
+// A query as the readers send it: its text, with "?" for each value.
+struct ErpQuery {
+    QString sql;
+    ErpParams params;
+};
+
 class ErpConnection {
 public:
     ErpConnection();
@@ -36,19 +48,24 @@ public:
 
     // Opens a forward-only, read-only recordset. Null when the query failed
     // (the driver's message in error).
-    std::unique_ptr<ErpRecordset> query(const QString& sql, QString* error);
+    std::unique_ptr<ErpRecordset> query(const QString& sql, const ErpParams& params, QString* error);
+    std::unique_ptr<ErpRecordset> query(const QString& sql, QString* error) { return query(sql, {}, error); }
+    std::unique_ptr<ErpRecordset> query(const ErpQuery& q, QString* error) { return query(q.sql, q.params, error); }
 
     // The number of rows a query returns, by a count over it, or -1 when the
     // server cannot count it (progress then shows nothing).
-    long long countRows(const QString& sql, QString* error = nullptr);
+    long long countRows(const QString& sql, const ErpParams& params, QString* error = nullptr);
+    long long countRows(const QString& sql, QString* error = nullptr) { return countRows(sql, {}, error); }
 
     // The text actually sent for a query: SQLite, standing in for the ERP's
     // server, lacks two literal forms the readers use (N'text' and
     // #dd/mm/yyyy#), so for SQLite alone they are rewritten. A date literal
     // becomes 'yyyy-mm-dd', and a column compared with it is compared by its
     // day (date(column)), since SQLite would compare a stored time as text.
-    QString dialectSql(const QString& sql) const;
-    static QString rewriteForSqlite(const QString& sql);
+    // A "?" whose value is a date is a day in the same way: the column beside
+    // it is taken to its day, and the value goes out as 'yyyy-mm-dd' text.
+    QString dialectSql(const QString& sql, const ErpParams& params = {}) const;
+    static QString rewriteForSqlite(const QString& sql, const ErpParams& params = {});
 
 private:
     friend class ErpRecordset;

@@ -80,6 +80,55 @@ private slots:
         QVERIFY(!rs->next());
         QVERIFY(!rs->failed());
     }
+
+    // A value bound to a marker reaches the SQLite driver whole, as wide
+    // text: it finds its own row and nothing else, and the table is untouched.
+    void boundValues_data()
+    {
+        QTest::addColumn<QString>("stored");
+        QTest::addColumn<QString>("where");
+        QTest::addColumn<QVariant>("value");
+        QTest::addColumn<bool>("found");
+        const auto text = [](const QString& t) { return QVariant(t); };
+        for (const QString& t : {QString::fromUtf8("בורג M6 (נירוסטה) 20 מ\"מ"), QString("\\'; DELETE FROM TEXTS; --"),
+                                 QString("O'R-5 \\\\ ''"), QString::fromUtf8("\xF0\x9F\x98\x80 שלום"), longText(5000),
+                                 QString("")})
+            QTest::addRow("text %s", qPrintable(t.left(12))) << t << "LONGDES = ?" << text(t) << true;
+        QTest::newRow("whole number") << "x" << "ID = ?" << QVariant(1) << true;
+        QTest::newRow("64-bit number") << "x" << "ID = ?" << QVariant(qlonglong(1)) << true;
+        QTest::newRow("decimal") << "x" << "ID < ?" << QVariant(1.5) << true;
+        QTest::newRow("null matches nothing") << "x" << "LONGDES = ?" << QVariant() << false;
+    }
+    void boundValues()
+    {
+        QFETCH(QString, stored);
+        QFETCH(QString, where);
+        QFETCH(QVariant, value);
+        QFETCH(bool, found);
+        {
+            Database db;
+            QVERIFY(!db.open(erpPath));
+            QVERIFY(!db.exec(QStringLiteral("DELETE FROM TEXTS; INSERT INTO TEXTS (ID, LONGDES) VALUES (2, 'other')")));
+            Statement insert = db.prepare(QStringLiteral("INSERT INTO TEXTS (ID, LONGDES) VALUES (1, ?1)"));
+            insert.bind(1, stored);
+            QVERIFY(!insert.run());
+        }
+        ErpConnection erp;
+        QString error;
+        QVERIFY2(erp.open(QStringLiteral("DSN=TagoraTexts"), 30, &error), qPrintable(error));
+        auto rs = erp.query(QStringLiteral("SELECT ID, LONGDES FROM TEXTS WHERE ") + where, {value}, &error);
+        QVERIFY2(rs, qPrintable(error));
+        QCOMPARE(rs->next(), found);
+        if (found) {
+            QCOMPARE(rs->value(0).toInt(), 1);
+            QCOMPARE(rs->value(1).toString(), stored);
+            QVERIFY(!rs->next());
+        }
+        QVERIFY(!rs->failed());
+        rs.reset();
+        QCOMPARE(erp.countRows(QStringLiteral("SELECT ID FROM TEXTS WHERE ") + where, {value}), found ? 1 : 0);
+        QCOMPARE(erp.countRows(QStringLiteral("SELECT ID FROM TEXTS")), 2);
+    }
 };
 
 QTEST_GUILESS_MAIN(TestOdbc)

@@ -193,30 +193,41 @@ private slots:
         QCOMPARE(erpDialect().dateDelimiter, typeTwo ? QString("'") : QString("#"));
     }
 
-    // SQLite stands in for the ERP's server; only its missing literal forms change.
+    // SQLite stands in for the ERP's server; only its missing literal forms
+    // change, and a column compared with a date value is taken to its day.
     void sqliteRewrite_data()
     {
         QTest::addColumn<QString>("sql");
+        QTest::addColumn<QVariantList>("values");
         QTest::addColumn<QString>("sent");
-        QTest::newRow("unicode literal") << "WHERE A = N'שלום'" << "WHERE A = 'שלום'";
+        const QVariantList none;
+        QTest::newRow("unicode literal") << "WHERE A = N'שלום'" << none << "WHERE A = 'שלום'";
         // A stored time must not put a date after the literal of its own day.
         QTest::newRow("date literal, column by its day")
-            << "T.D >= #05/03/2024# AND D<=#5/3/2024#" << "date(T.D) >= '2024-03-05' AND date(D)<='2024-03-05'";
-        QTest::newRow("column after the literal") << "WHERE #05/03/2024# <> T.D" << "WHERE '2024-03-05' <> date(T.D)";
-        QTest::newRow("no column to compare") << "SELECT #05/03/2024#, f(X) >= #05/03/2024#"
+            << "T.D >= #05/03/2024# AND D<=#5/3/2024#" << none << "date(T.D) >= '2024-03-05' AND date(D)<='2024-03-05'";
+        QTest::newRow("column after the literal") << "WHERE #05/03/2024# <> T.D" << none << "WHERE '2024-03-05' <> date(T.D)";
+        QTest::newRow("no column to compare") << "SELECT #05/03/2024#, f(X) >= #05/03/2024#" << none
                                               << "SELECT '2024-03-05', f(X) >= '2024-03-05'";
-        QTest::newRow("function after the literal") << "#05/03/2024# = f(X)" << "'2024-03-05' = f(X)";
-        QTest::newRow("end of a case") << "CASE WHEN A THEN D END >= #05/03/2024#"
+        QTest::newRow("function after the literal") << "#05/03/2024# = f(X)" << none << "'2024-03-05' = f(X)";
+        QTest::newRow("end of a case") << "CASE WHEN A THEN D END >= #05/03/2024#" << none
                                        << "CASE WHEN A THEN D END >= '2024-03-05'";
-        QTest::newRow("inside a string untouched") << "WHERE A = 'N''#05/03/2024#'" << "WHERE A = 'N''#05/03/2024#'";
-        QTest::newRow("identifier ending in N") << "SELECT PARTN'x'" << "SELECT PARTN'x'";
-        QTest::newRow("plain") << "SELECT 1" << "SELECT 1";
+        QTest::newRow("inside a string untouched") << "WHERE A = 'N''#05/03/2024#'" << none << "WHERE A = 'N''#05/03/2024#'";
+        QTest::newRow("identifier ending in N") << "SELECT PARTN'x'" << none << "SELECT PARTN'x'";
+        QTest::newRow("plain") << "SELECT 1" << none << "SELECT 1";
+        // Only the markers whose values are dates touch their columns; a
+        // question mark inside a string is no marker.
+        QTest::newRow("date values among others")
+            << "WHERE A = ? AND T.D >= ? AND B = '?' AND ? <= T.E AND C = ?"
+            << QVariantList{QString("x"), QDate(2024, 3, 5), QDateTime(QDate(2024, 3, 5), QTime(8, 0)), 7}
+            << "WHERE A = ? AND date(T.D) >= ? AND B = '?' AND ? <= date(T.E) AND C = ?";
+        QTest::newRow("minutes are no date") << "WHERE T.D >= ?" << QVariantList{19353600} << "WHERE T.D >= ?";
     }
     void sqliteRewrite()
     {
         QFETCH(QString, sql);
+        QFETCH(QVariantList, values);
         QFETCH(QString, sent);
-        QCOMPARE(ErpConnection::rewriteForSqlite(sql), sent);
+        QCOMPARE(ErpConnection::rewriteForSqlite(sql, values), sent);
     }
 };
 
