@@ -12,13 +12,6 @@ constexpr int kItemTimeout = 120;
 constexpr int kOtherTimeout = 60;
 constexpr int kPriceFieldTimeout = 30;
 
-QString quoted(const QString& value)
-{
-    QString v = value;
-    v.replace(QLatin1Char('\''), QLatin1String("''"));
-    return v;
-}
-
 // An ERP key as the local tables keep it: trimmed, double quotes made
 // apostrophes, converted from visual order. Empty means "skip the row".
 QString localKey(const QVariant& value)
@@ -49,7 +42,7 @@ public:
     ~ReaderRun() { report(0); }
 
     // Opens the local database and the ERP query; false with the error set.
-    bool start(const QString& dbPath, const QString& sql, ReadError* error, bool count = true)
+    bool start(const QString& dbPath, const ErpQuery& q, ReadError* error, bool count = true)
     {
         DbError e = m_db.open(dbPath);
         if (!e)
@@ -60,8 +53,8 @@ public:
         if (!m_erp.open(m_ctx.connString, m_timeout, &message))
             return fail(error, QString(), message);
         if (count)
-            m_count = m_erp.countRows(sql);
-        m_rs = m_erp.query(sql, &message);
+            m_count = m_erp.countRows(q.sql, q.params);
+        m_rs = m_erp.query(q, &message);
         if (!m_rs)
             return fail(error, QString(), message);
         return true;
@@ -136,21 +129,39 @@ bool insertRow(Statement& s, ReaderRun& run, ReadError* error, const QString& ti
 }
 } // namespace
 
-QString familyRangeSql(const QString& fromSort, const QString& toSort)
+ErpQuery familyRangeSql(const QString& fromSort, const QString& toSort)
 {
-    QString r;
-    if (!fromSort.isEmpty())
-        r += QStringLiteral(" And PART.FAMILYNAME >= '") + quoted(fromSort) + QLatin1Char('\'');
-    if (!toSort.isEmpty())
-        r += QStringLiteral(" And PART.FAMILYNAME <= '") + quoted(toSort) + QLatin1Char('\'');
+    ErpQuery r;
+    if (!fromSort.isEmpty()) {
+        r.sql += QStringLiteral(" And PART.FAMILYNAME >= ?");
+        r.params << fromSort;
+    }
+    if (!toSort.isEmpty()) {
+        r.sql += QStringLiteral(" And PART.FAMILYNAME <= ?");
+        r.params << toSort;
+    }
     return r;
 }
 
-QString itemQuerySql(const QString& fromSort, const QString& toSort, bool foreignNames, int priceList,
-                     bool withWarehouse, const QString& docCriteria)
+namespace {
+// The family range, then the restriction to the documents' items, then the order.
+ErpQuery withRange(ErpQuery q, const QString& fromSort, const QString& toSort, const QString& docCriteria,
+                   const QString& orderBy)
+{
+    const ErpQuery range = familyRangeSql(fromSort, toSort);
+    q.sql += range.sql + docCriteria + orderBy;
+    q.params += range.params;
+    return q;
+}
+} // namespace
+
+ErpQuery itemQuerySql(const QString& fromSort, const QString& toSort, bool foreignNames, int priceList,
+                      bool withWarehouse, const QString& docCriteria)
 {
     const bool p = priceList != 0;
-    QString sql = QStringLiteral("SELECT PART.PARTNAME, PART.PARTDES, FAMILY.FAMILYNAME, UNIT.UNITNAME, PART.BARCODE");
+    ErpQuery q;
+    QString& sql = q.sql;
+    sql = QStringLiteral("SELECT PART.PARTNAME, PART.PARTDES, FAMILY.FAMILYNAME, UNIT.UNITNAME, PART.BARCODE");
     sql += p ? QStringLiteral(", PARTPRICE.PRICE, CURRENCIES.CODE AS CURRCODE") : QStringLiteral(", 0 AS PRICE, 0 AS CURRCODE");
     if (foreignNames)
         sql += QStringLiteral(", PARTDES.EPARTDES");
@@ -166,56 +177,60 @@ QString itemQuerySql(const QString& fromSort, const QString& toSort, bool foreig
                           " AND UNIT.UNIT = PART.UNIT");
     if (foreignNames)
         sql += QStringLiteral(" AND PARTDES.PART = PART.PART");
-    if (p)
-        sql += QStringLiteral(" AND PARTPRICE.PART = PART.PART AND PARTPRICE.PLIST = %1"
-                              " AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY")
-                   .arg(priceList);
+    if (p) {
+        sql += QStringLiteral(" AND PARTPRICE.PART = PART.PART AND PARTPRICE.PLIST = ?"
+                              " AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY");
+        q.params << priceList;
+    }
     if (withWarehouse)
         sql += QStringLiteral(" AND PARTPARAM.PART = PART.PART AND PARTPARAM.WARHS = WAREHOUSES.WARHS");
-    sql += familyRangeSql(fromSort, toSort) + docCriteria + QStringLiteral(" Order By PART.PARTNAME");
-    return sql;
+    return withRange(q, fromSort, toSort, docCriteria, QStringLiteral(" Order By PART.PARTNAME"));
 }
 
-QString foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria)
+ErpQuery foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria)
 {
-    return QStringLiteral("SELECT PART.PARTNAME, PARTDES.EPARTDES FROM PART, FAMILY, PARTDES"
-                          " WHERE (PART.TYPE = 'R' OR PART.TYPE = 'P') AND FAMILY.FAMILY = PART.FAMILY"
-                          " AND PARTDES.PART = PART.PART")
-        + familyRangeSql(fromSort, toSort) + docCriteria + QStringLiteral(" Order By PART.PARTNAME");
+    return withRange({QStringLiteral("SELECT PART.PARTNAME, PARTDES.EPARTDES FROM PART, FAMILY, PARTDES"
+                                     " WHERE (PART.TYPE = 'R' OR PART.TYPE = 'P') AND FAMILY.FAMILY = PART.FAMILY"
+                                     " AND PARTDES.PART = PART.PART"),
+                      {}},
+                     fromSort, toSort, docCriteria, QStringLiteral(" Order By PART.PARTNAME"));
 }
 
-QString alterKeyQuerySql(bool suppliers, const QString& docCriteria)
+ErpQuery alterKeyQuerySql(bool suppliers, const QString& docCriteria)
 {
     if (suppliers)
-        return QStringLiteral("SELECT SUPPLIERS.SUPNAME, PART.PARTNAME, SUPPART.SUPPARTNAME"
-                              " FROM SUPPLIERS, SUPPART, PART WHERE SUPPLIERS.SUP = SUPPART.SUP"
-                              " AND PART.PART = SUPPART.PART")
-            + docCriteria;
-    return QStringLiteral("SELECT CUSTOMERS.CUSTNAME, PART.PARTNAME, CUSTPART.CUSTPARTNAME"
-                          " FROM CUSTOMERS, CUSTPART, PART WHERE CUSTOMERS.CUST = CUSTPART.CUST"
-                          " AND PART.PART = CUSTPART.PART")
-        + docCriteria;
+        return {QStringLiteral("SELECT SUPPLIERS.SUPNAME, PART.PARTNAME, SUPPART.SUPPARTNAME"
+                               " FROM SUPPLIERS, SUPPART, PART WHERE SUPPLIERS.SUP = SUPPART.SUP"
+                               " AND PART.PART = SUPPART.PART")
+                    + docCriteria,
+                {}};
+    return {QStringLiteral("SELECT CUSTOMERS.CUSTNAME, PART.PARTNAME, CUSTPART.CUSTPARTNAME"
+                           " FROM CUSTOMERS, CUSTPART, PART WHERE CUSTOMERS.CUST = CUSTPART.CUST"
+                           " AND PART.PART = CUSTPART.PART")
+                + docCriteria,
+            {}};
 }
 
-QString alterPriceQuerySql(const QString& todayLiteral, const QString& docCriteria)
+ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria)
 {
-    return QStringLiteral("SELECT CUSTOMERS.CUSTNAME As AccountKey, PART.PARTNAME As ItemKey"
-                          ", CUSTPARTPRICE.PRICE, CURRENCIES.CODE As CurrencyCode"
-                          " FROM CUSTOMERS, CUSTPARTPRICE, PART, CURRENCIES"
-                          " WHERE CUSTOMERS.CUST = CUSTPARTPRICE.CUST AND PART.PART = CUSTPARTPRICE.PART"
-                          " AND CURRENCIES.CURRENCY = CUSTPARTPRICE.CURRENCY"
-                          " AND CUSTPARTPRICE.EXPIRYDATE >= %1 AND CUSTPARTPRICE.FROMDATE <= %1")
-               .arg(todayLiteral)
-        + docCriteria;
+    return {QStringLiteral("SELECT CUSTOMERS.CUSTNAME As AccountKey, PART.PARTNAME As ItemKey"
+                           ", CUSTPARTPRICE.PRICE, CURRENCIES.CODE As CurrencyCode"
+                           " FROM CUSTOMERS, CUSTPARTPRICE, PART, CURRENCIES"
+                           " WHERE CUSTOMERS.CUST = CUSTPARTPRICE.CUST AND PART.PART = CUSTPARTPRICE.PART"
+                           " AND CURRENCIES.CURRENCY = CUSTPARTPRICE.CURRENCY"
+                           " AND CUSTPARTPRICE.EXPIRYDATE >= ? AND CUSTPARTPRICE.FROMDATE <= ?")
+                + docCriteria,
+            {today, today}};
 }
 
-QString priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria)
+ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria)
 {
-    return QStringLiteral("SELECT PARTPRICE.PLIST, PART.PARTNAME, PARTPRICE.PRICE, CURRENCIES.CODE"
-                          " FROM CURRENCIES, PARTPRICE, PART, FAMILY"
-                          " WHERE (PART.TYPE = 'R' OR PART.TYPE = 'P') AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY"
-                          " AND PARTPRICE.PART = PART.PART AND FAMILY.FAMILY = PART.FAMILY")
-        + familyRangeSql(fromSort, toSort) + docCriteria + QStringLiteral(" ORDER BY PARTPRICE.PLIST, PART.PARTNAME");
+    return withRange({QStringLiteral("SELECT PARTPRICE.PLIST, PART.PARTNAME, PARTPRICE.PRICE, CURRENCIES.CODE"
+                                     " FROM CURRENCIES, PARTPRICE, PART, FAMILY"
+                                     " WHERE (PART.TYPE = 'R' OR PART.TYPE = 'P') AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY"
+                                     " AND PARTPRICE.PART = PART.PART AND FAMILY.FAMILY = PART.FAMILY"),
+                      {}},
+                     fromSort, toSort, docCriteria, QStringLiteral(" ORDER BY PARTPRICE.PLIST, PART.PARTNAME"));
 }
 
 bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QString& fromSort,
@@ -223,7 +238,7 @@ bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QS
                       bool withWarehouse, ReadError* error)
 {
     ReaderRun run(ctx, QStringLiteral("קורא פריטים"), QStringLiteral("Error reading item: "), kItemTimeout);
-    const QString sql = itemQuerySql(fromSort, toSort, foreignNames, priceList, withWarehouse,
+    const ErpQuery sql = itemQuerySql(fromSort, toSort, foreignNames, priceList, withWarehouse,
                                      byDocs ? ctx.itemByDocCriteria : QString());
     if (!run.start(dbPath, sql, error))
         return false;
@@ -351,7 +366,7 @@ bool ReadAlterPricePRIORITY(const ErpReadContext& ctx, const QString& dbPath, bo
                             ReadError* error)
 {
     ReaderRun run(ctx, QStringLiteral("קורא מחירים מיוחדים"), QStringLiteral("Error reading alter price: "), kOtherTimeout);
-    const QString sql = alterPriceQuerySql(DateToErpLiteral(QVariant(ctx.today)), byDocs ? ctx.itemByDocCriteria : QString());
+    const ErpQuery sql = alterPriceQuerySql(DateToErp(QVariant(ctx.today)), byDocs ? ctx.itemByDocCriteria : QString());
     if (!run.start(dbPath, sql, error))
         return false;
     Statement insert = run.prepare(
@@ -416,7 +431,7 @@ bool ReadPriceListPriority(const ErpReadContext& ctx, const QString& dbPath, con
 bool ReadPriceListNamePriority(const ErpReadContext& ctx, const QString& dbPath, ReadError* error)
 {
     ReaderRun run(ctx, QString(), QStringLiteral("תקלה"), kOtherTimeout, 1);
-    const QString sql = QStringLiteral("SELECT PLIST, PLNAME, PLDES FROM PRICELIST WHERE PLIST <> 0");
+    const ErpQuery sql{QStringLiteral("SELECT PLIST, PLNAME, PLDES FROM PRICELIST WHERE PLIST <> 0"), {}};
     if (!run.start(dbPath, sql, error))
         return false;
     Statement insert = run.prepare(QStringLiteral("INSERT INTO tPLName (PLID, PLName) VALUES (?1, ?2)"), error);

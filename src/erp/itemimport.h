@@ -1,5 +1,7 @@
 #pragma once
 
+#include "erp/odbc.h"
+
 #include <QDate>
 #include <QString>
 #include <QVector>
@@ -54,13 +56,16 @@ struct PriceField {
 };
 QVector<PriceField> ReadPriceFields(const QString& connString, QString* error);
 
-// The SQL texts the readers send (range bounds and criteria included).
-QString itemQuerySql(const QString& fromSort, const QString& toSort, bool foreignNames, int priceList,
-                     bool withWarehouse, const QString& docCriteria);
-QString foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria);
-QString alterKeyQuerySql(bool suppliers, const QString& docCriteria);
-QString alterPriceQuerySql(const QString& todayLiteral, const QString& docCriteria);
-QString priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria);
-QString familyRangeSql(const QString& fromSort, const QString& toSort);
+// The queries the readers send: range bounds, the price-list number and the
+// day go in as values, never as SQL text; the criteria of the documents'
+// items are SQL of their own.
+ErpQuery itemQuerySql(const QString& fromSort, const QString& toSort, bool foreignNames, int priceList,
+                      bool withWarehouse, const QString& docCriteria);
+ErpQuery foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria);
+ErpQuery alterKeyQuerySql(bool suppliers, const QString& docCriteria);
+// today: the day as the ERP keeps it (DateToErp: a date, or minutes for connection type 2).
+ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria);
+ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria);
+ErpQuery familyRangeSql(const QString& fromSort, const QString& toSort);
 
 } // namespace tagora

@@ -14,14 +14,19 @@ namespace {
 
 const QDate kToday(2024, 2, 29);
 
-// The rows of a query as the readers send it, with the literals SQLite lacks rewritten.
+// The rows of a query as the readers send it, with the literals SQLite lacks
+// rewritten and its values bound (a date as the day's text, as the ODBC layer sends it).
 using Rows = QList<QVariantList>;
-Rows query(const Database& db, const QString& erpSql, QString* error)
+Rows query(const Database& db, const ErpQuery& erp, QString* error)
 {
-    const QString sql = ErpConnection::rewriteForSqlite(erpSql);
+    const QString sql = ErpConnection::rewriteForSqlite(erp.sql, erp.params);
     Rows out;
     DbError e;
     Statement s = db.prepare(sql, &e);
+    for (int i = 0; !e && i < erp.params.size(); ++i) {
+        const QVariant& v = erp.params[i];
+        s.bind(i + 1, v.typeId() == QMetaType::QDate ? QVariant(v.toDate().toString(Qt::ISODate)) : v);
+    }
     Statement::Step step = Statement::Step::Error;
     while (!e && (step = s.step()) == Statement::Step::Row) {
         out << QVariantList();
@@ -31,6 +36,11 @@ Rows query(const Database& db, const QString& erpSql, QString* error)
     if (e || step == Statement::Step::Error)
         *error = (e ? e.message : s.error().message) + u" in: "_s + sql;
     return out;
+}
+
+Rows query(const Database& db, const QString& erpSql, QString* error)
+{
+    return query(db, ErpQuery{erpSql, {}}, error);
 }
 
 QStringList column(const Rows& rows, int c)
@@ -219,7 +229,7 @@ private slots:
         QCOMPARE(shown.filter(QRegularExpression(u"^[1-9]\\d*:(?!-$)."_s)).size(), 1);
 
         // Special prices in and out of date, on their first and last days.
-        QUERY(valid, db, alterPriceQuerySql(DateToErpLiteral(QDate(kToday), short(connType)), {}));
+        QUERY(valid, db, alterPriceQuerySql(DateToErp(QDate(kToday), short(connType)), {}));
         QUERY(all, db, u"SELECT FROMDATE, EXPIRYDATE FROM CUSTPARTPRICE"_s);
         int expected = 0;
         QSet<QString> kinds;

@@ -1,6 +1,9 @@
 // The item import from a real SQL server: the demo company loaded into
 // PostgreSQL, read through its ODBC driver as connection type 2, must give
-// the same local tables as the same company read from SQLite.
+// the same local tables as the same company read from SQLite. A second copy
+// of the company sits in a database whose server reads a backslash inside a
+// literal as an escape (standard_conforming_strings off), where doubling
+// apostrophes would not keep a value from ending its literal.
 #include "support/dbrows.h"
 #include "support/erpfixture.h"
 
@@ -23,6 +26,33 @@ class TestPgImport : public QObject {
     QTemporaryDir work;
     QString port = qEnvironmentVariable("TAGORA_PG_PORT", "54329");
     QDate today = QDate::currentDate();
+    QString lite;
+
+    bool psql(const QStringList& args, QString* error)
+    {
+        QProcess p;
+        p.start(QStandardPaths::findExecutable("psql"),
+                QStringList{"-h", "127.0.0.1", "-p", port, "-U", "postgres", "-q", "-v", "ON_ERROR_STOP=1"} + args);
+        if (!p.waitForFinished(120000) || p.exitCode() != 0) {
+            *error = QString::fromUtf8(p.readAllStandardError());
+            return false;
+        }
+        return true;
+    }
+
+    QString pgConn(const QString& dsn) const { return BuildConnString(dsn, "postgres", QVariant(), "", 2); }
+
+    int canaryRows(const QString& dsn)
+    {
+        if (dsn == "TagoraLite")
+            return scalar(lite, "SELECT count(*) FROM canary").toInt();
+        ErpConnection c;
+        QString e;
+        if (!c.open(pgConn(dsn), 10, &e))
+            return -1;
+        auto rs = c.query("SELECT count(*) FROM canary", &e);
+        return rs && rs->next() ? int(rs->value(0).toLongLong()) : -1;
+    }
 
     // Every reader of the item import into a fresh items database; the tables it leaves.
     QStringList importAll(const QString& dsn, const QString& tag)
@@ -63,21 +93,29 @@ private slots:
         o.connType = 2;
         o.today = today;
         o.labelLists = false;
-        odbc.addDemo("TagoraLite", o);
+        lite = odbc.addDemo("TagoraLite", o);
         const QString script = work.filePath("demo.sql");
         QFile f(script);
         QVERIFY(f.open(QIODevice::WriteOnly));
         f.write(DemoErpScript(o).toUtf8());
         f.close();
-        const QString psql = QStandardPaths::findExecutable("psql");
-        QVERIFY2(!psql.isEmpty(), "psql is not installed");
-        QProcess p;
-        p.start(psql, {"-h", "127.0.0.1", "-p", port, "-U", "postgres", "-d", "postgres", "-q", "-v", "ON_ERROR_STOP=1",
-                       "-f", script});
-        QVERIFY(p.waitForFinished(120000));
-        QVERIFY2(p.exitCode() == 0, p.readAllStandardError().constData());
-        odbc.addDsn("TagoraPg", {{"Driver", "PostgreSQL Unicode"}, {"Servername", "127.0.0.1"}, {"Port", port},
-                                 {"Database", "postgres"}, {"Username", "postgres"}});
+        QVERIFY2(!QStandardPaths::findExecutable("psql").isEmpty(), "psql is not installed");
+        QString e;
+        // Rows no reader may touch, and the same company where backslashes escape.
+        const QString canary = "DROP TABLE IF EXISTS canary; CREATE TABLE canary (n int); INSERT INTO canary VALUES (1), (2), (3);";
+        QVERIFY2(psql({"-d", "postgres", "-f", script, "-c", canary}, &e), qPrintable(e));
+        QVERIFY2(psql({"-d", "postgres", "-c", "DROP DATABASE IF EXISTS backslashes",
+                       "-c", "CREATE DATABASE backslashes TEMPLATE postgres",
+                       "-c", "ALTER DATABASE backslashes SET standard_conforming_strings = off"}, &e),
+                 qPrintable(e));
+        {
+            Database d;
+            QVERIFY(!d.open(lite));
+            QVERIFY(!d.exec(canary));
+        }
+        for (const auto& [dsn, db] : {std::pair{"TagoraPg", "postgres"}, {"TagoraPgBackslash", "backslashes"}})
+            odbc.addDsn(dsn, {{"Driver", "PostgreSQL Unicode"}, {"Servername", "127.0.0.1"}, {"Port", port},
+                              {"Database", db}, {"Username", "postgres"}});
     }
 
     void serverNamesItself()
@@ -102,6 +140,103 @@ private slots:
         const QStringList fromLite = importAll("TagoraLite", "lite");
         QVERIFY(fromLite.size() > 100);
         QCOMPARE(fromPg, fromLite);
+    }
+
+    // Values go to the server bound, as wide text: Hebrew, quotes and
+    // backslashes arrive as written, whatever the server makes of a backslash.
+    void boundValuesFindTheirRows_data()
+    {
+        QTest::addColumn<QString>("dsn");
+        QTest::addColumn<QString>("column");
+        QTest::addColumn<QString>("sample");
+        for (const char* dsn : {"TagoraPg", "TagoraPgBackslash"}) {
+            QTest::addRow("%s, Hebrew description", dsn)
+                << dsn << "PARTDES" << QString::fromUtf8("SELECT min(PARTDES) FROM PART WHERE PARTDES LIKE 'בורג%'");
+            QTest::addRow("%s, key with a quote", dsn)
+                << dsn << "PARTNAME" << "SELECT min(PARTNAME) FROM PART WHERE PARTNAME LIKE '%''%'";
+        }
+    }
+    void boundValuesFindTheirRows()
+    {
+        QFETCH(QString, dsn);
+        QFETCH(QString, column);
+        QFETCH(QString, sample);
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(pgConn(dsn), 10, &e), qPrintable(e));
+        auto rs = c.query(sample, &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        const QString value = rs->value(0).toString();
+        QVERIFY(!value.isEmpty());
+        const QString find = QStringLiteral("SELECT %1 FROM PART WHERE %1 = ?").arg(column);
+        rs = c.query(find, {value}, &e);
+        QVERIFY2(rs, qPrintable(e));
+        QVERIFY2(rs->next(), qPrintable(value));
+        QCOMPARE(rs->value(0).toString(), value);
+        // A backslash before the quote is part of the value, and nothing matches it.
+        rs = c.query(find, {"\\'" + value}, &e);
+        QVERIFY2(rs, qPrintable(e));
+        QVERIFY(!rs->next());
+        QVERIFY(!rs->failed());
+    }
+
+    // A family range whose bounds try to end their literal (a backslash
+    // before the quote, for a server that reads it as an escape) is a range
+    // like any other: the canary table keeps its rows, and the readers import
+    // exactly the items within the bounds as the values read, or none.
+    void hostileRangeIsAValue_data()
+    {
+        QTest::addColumn<QString>("dsn");
+        QTest::addColumn<QString>("from");
+        QTest::addColumn<QString>("to");
+        const QString dropper = "\\'; DELETE FROM canary; --";
+        for (const char* dsn : {"TagoraPgBackslash", "TagoraPg", "TagoraLite"}) {
+            QTest::addRow("%s, lower bound deletes", dsn) << dsn << dropper << "";
+            QTest::addRow("%s, upper bound deletes", dsn) << dsn << "" << "200" + dropper;
+            QTest::addRow("%s, lower bound widens to every item", dsn) << dsn << "100\\' OR 1=1 --" << "200";
+        }
+    }
+    void hostileRangeIsAValue()
+    {
+        QFETCH(QString, dsn);
+        QFETCH(QString, from);
+        QFETCH(QString, to);
+        if (dsn == "TagoraPgBackslash") {
+            // The premise: this server does read backslashes in literals.
+            ErpConnection c;
+            QString e;
+            QVERIFY2(c.open(pgConn(dsn), 10, &e), qPrintable(e));
+            auto rs = c.query("SELECT current_setting('standard_conforming_strings')", &e);
+            QVERIFY2(rs && rs->next(), qPrintable(e));
+            QCOMPARE(rs->value(0).toString(), QString("off"));
+        }
+        const QString items = work.filePath(QString("range-%1.tdb").arg(QTest::currentDataTag()).replace(' ', '_'));
+        const QString staging = items + ".tmp";
+        DbError de;
+        QVERIFY(!CreateItemsDB(items, &de).isEmpty() && !CreateTempItemsDB(staging, items, &de).isEmpty());
+        const ErpReadContext ctx{pgConn(dsn), nullptr, QString(), today};
+        ReadError e;
+        QVERIFY2(ReadItemPriority(ctx, items, from, to, false, 1, 1, false, false, &e)
+                     && ReadItemFName(ctx, items, from, to, false, &e)
+                     && ReadPriceListPriority(ctx, staging, from, to, false, "tTempPriceList", &e),
+                 qPrintable(e.title + e.message));
+        QCOMPARE(canaryRows(dsn), 3);
+
+        // The same bounds as values, straight from the company's file.
+        const QString inRange = " AND trim(PARTNAME) <> '' AND TYPE IN ('R', 'P') AND FAMILY.FAMILY = PART.FAMILY"
+                                " AND PARTPRICE.PART = PART.PART AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY"
+                                " AND PART.FAMILYNAME >= coalesce(nullif(?1, ''), PART.FAMILYNAME)"
+                                " AND PART.FAMILYNAME <= coalesce(nullif(?2, ''), PART.FAMILYNAME)"
+                                " ORDER BY 1 COLLATE BINARY";
+        const QString key = "SELECT DISTINCT replace(trim(PARTNAME), '\"', '''') FROM PART, FAMILY, PARTPRICE, CURRENCIES";
+        const QStringList expectedItems = rows(
+            lite, key + ", UNIT WHERE UNIT.UNIT = PART.UNIT AND PLIST = 1" + inRange, {from, to});
+        QCOMPARE(rows(items, "SELECT ItemKey FROM tItems ORDER BY 1 COLLATE BINARY"), expectedItems);
+        QCOMPARE(rows(staging, "SELECT DISTINCT ItemKey FROM tTempPriceList ORDER BY 1 COLLATE BINARY"),
+                 rows(lite, key + " WHERE PLIST <> 0" + inRange, {from, to}));
+        // The bounds that reach the server whole leave the families beyond them out.
+        QCOMPARE(scalar(items, "SELECT count(*) FROM tItems WHERE ItemSort > '200'").toInt(), 0);
+        QCOMPARE(expectedItems.isEmpty(), to.isEmpty());
     }
 
     void priceFieldsFromServer()

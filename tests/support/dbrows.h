@@ -5,13 +5,15 @@
 
 #include <QStringList>
 
-inline QStringList rows(const QString& dbPath, const QString& sql)
+inline QStringList rows(const QString& dbPath, const QString& sql, const QVariantList& values = {})
 {
     tagora::Database db;
     if (db.open(dbPath))
         return {QStringLiteral("<cannot open>")};
     QStringList out;
     tagora::Statement s = db.prepare(sql);
+    for (int i = 0; i < values.size(); ++i)
+        s.bind(i + 1, values[i]);
     while (s.step() == tagora::Statement::Step::Row) {
         QStringList cells;
         for (int i = 0; i < s.columnCount(); ++i)
