@@ -234,30 +234,31 @@ void MainCard::ImportItems()
         return fail(e.message);
     const short foreign = ui->CmbItemNameType->currentIndex() == 1 ? -1 : 0;
 
-    {
-        Database items;
-        if ((e = items.open(itemsDb)))
-            return fail(e.message);
-        if (cleanItems) {
-            setMessage(QStringLiteral("מנקה פריטים..."));
-            if ((e = items.exec(QStringLiteral("DELETE FROM tItems"))))
-                return fail(e.message);
-            if (ui->ChkImportAlterPrices->isChecked() && (e = items.exec(QStringLiteral("DELETE FROM tAlterPrices"))))
-                return fail(e.message);
-        }
-        if (cleanAlter) {
-            setMessage(QStringLiteral("מנקה מקטים חליפיים..."));
-            if ((e = items.exec(QStringLiteral("DELETE FROM tAlterKeys"))))
-                return fail(e.message);
-        }
+    // Nothing is emptied here: each table is emptied in the transaction that
+    // refills it (the items by their reader, the alternate keys and special
+    // prices by the merge), so a crash or a failure part way leaves the old rows.
+    QStringList emptiedByMerge;
+    if (cleanItems) {
+        setMessage(QStringLiteral("מנקה פריטים..."));
+        if (ui->ChkImportAlterPrices->isChecked())
+            emptiedByMerge << QStringLiteral("tAlterPrices");
+    }
+    if (cleanAlter) {
+        setMessage(QStringLiteral("מנקה מקטים חליפיים..."));
+        emptiedByMerge << QStringLiteral("tAlterKeys");
     }
 
     const QString fromSort = ui->txtFromItemSort->text();
     const QString toSort = ui->txtToItemSort->text();
     setMessage(QStringLiteral("קורא פריטים..."));
-    if (!ReadItemPriority(conn, itemsDb, fromSort, toSort, foreign, copies, priceList, true, false,
-                          ui->chkReadItemParam->isChecked()))
-        return;
+    {
+        ReadError readError;
+        const ErpReadContext ctx{conn, this, m_currentItemByDocCriteria};
+        if (!reportRead(tagora::ReadItemPriority(ctx, itemsDb, fromSort, toSort, foreign != 0, copies, priceList,
+                                                 false, ui->chkReadItemParam->isChecked(), &readError, cleanItems),
+                        readError))
+            return;
+    }
     setMessage(QStringLiteral("קורא שמות לועזיים..."));
     if (!ReadItemFName(conn, itemsDb, fromSort, toSort, false))
         return;
@@ -284,7 +285,7 @@ void MainCard::ImportItems()
     }
     setMessage(QStringLiteral("מעדכן נתוני פריטים בטבלאות ראשיות..."));
     QString mergeError;
-    if (!tagora::UpdateMainItemTables(tempItemsDb, &mergeError))
+    if (!tagora::UpdateMainItemTables(tempItemsDb, &mergeError, emptiedByMerge))
         return fail(mergeError);
     if (!QFileInfo::exists(tempDocsDb)) {
         setMessage(QStringLiteral("מכין את בסיס הנתונים..."));

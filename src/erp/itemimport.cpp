@@ -91,10 +91,18 @@ public:
         return true;
     }
 
+    // From here on a failure keeps nothing of this run: the reader replaces a
+    // table, and half a replacement is worse than the old rows.
+    void allOrNothing() { m_allOrNothing = true; }
+
     bool fail(ReadError* error, const QString& title, const QString& message)
     {
-        if (m_db.inTransaction())
-            m_db.commit();
+        if (m_db.inTransaction()) {
+            if (m_allOrNothing)
+                m_db.rollback();
+            else
+                m_db.commit();
+        }
         if (error)
             *error = {title.isEmpty() ? m_title : title, message};
         return false;
@@ -116,6 +124,7 @@ private:
     std::unique_ptr<ErpRecordset> m_rs;
     long long m_count = -1;
     long long m_row = 0;
+    bool m_allOrNothing = false;
 };
 
 // Runs an insert for one row: a duplicate key is skipped, any other error stops.
@@ -235,7 +244,7 @@ ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const
 
 bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QString& fromSort,
                       const QString& toSort, bool foreignNames, short copies, int priceList, bool byDocs,
-                      bool withWarehouse, ReadError* error)
+                      bool withWarehouse, ReadError* error, bool replaceAll)
 {
     ReaderRun run(ctx, QStringLiteral("קורא פריטים"), QStringLiteral("Error reading item: "), kItemTimeout);
     const ErpQuery sql = itemQuerySql(fromSort, toSort, foreignNames, priceList, withWarehouse,
@@ -256,6 +265,13 @@ bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QS
         error);
     if (!upsert.isValid())
         return false;
+    // Emptied in the transaction that refills it, so until the last row is in
+    // the old items and their marks are what a crash or an error leaves.
+    if (replaceAll) {
+        run.allOrNothing();
+        if (const DbError e = run.db().exec(QStringLiteral("DELETE FROM tItems")))
+            return run.fail(error, QString(), e.message);
+    }
     ErpRecordset& rs = run.rs();
     const int cName = rs.columnIndex(QStringLiteral("PARTNAME")), cDes = rs.columnIndex(QStringLiteral("PARTDES"));
     const int cFamily = rs.columnIndex(QStringLiteral("FAMILYNAME")), cUnit = rs.columnIndex(QStringLiteral("UNITNAME"));
@@ -448,12 +464,15 @@ bool ReadPriceListNamePriority(const ErpReadContext& ctx, const QString& dbPath,
     return run.finish(error);
 }
 
-bool UpdateMainItemTables(const QString& tempItemsPath, QString* error)
+bool UpdateMainItemTables(const QString& tempItemsPath, QString* error, const QStringList& emptyFirst)
 {
     Database db;
     DbError e = db.open(tempItemsPath);
     if (!e) {
         Transaction tx(db);
+        for (const QString& table : emptyFirst)
+            if (!e)
+                e = db.exec(QStringLiteral("DELETE FROM \"%1\"").arg(table));
         for (const char* q : {"qAddUpdateAlterKeys", "qAddUpdateAlterPrices", "qAddUpdatePriceList"})
             if (!e)
                 e = db.runQuery(QLatin1String(q));

@@ -4,6 +4,7 @@
 
 #include <QDate>
 #include <QString>
+#include <QStringList>
 #include <QVector>
 
 namespace tagora {
@@ -31,9 +32,12 @@ struct ReadError {
 // transaction with prepared statements, and closes everything before it
 // returns. A duplicate key in the local table skips that row; any other error
 // stops the reader (rows written before it stay) and returns false.
+// With replaceAll the item reader empties tItems first, in its own
+// transaction: it keeps all or nothing, and the old items stay until the new
+// ones are all in.
 bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QString& fromSort,
                       const QString& toSort, bool foreignNames, short copies, int priceList, bool byDocs,
-                      bool withWarehouse, ReadError* error);
+                      bool withWarehouse, ReadError* error, bool replaceAll = false);
 bool ReadItemFName(const ErpReadContext& ctx, const QString& dbPath, const QString& fromSort, const QString& toSort,
                    bool byDocs, ReadError* error);
 bool ReadAlterKeyPRIORITY(const ErpReadContext& ctx, const QString& dbPath, bool byDocs, const QString& table,
@@ -46,8 +50,10 @@ bool ReadPriceListPriority(const ErpReadContext& ctx, const QString& dbPath, con
                            const QString& toSort, bool byDocs, const QString& table, ReadError* error);
 bool ReadPriceListNamePriority(const ErpReadContext& ctx, const QString& dbPath, ReadError* error);
 
-// Merges the staging rows of the temporary items database into the main tables.
-bool UpdateMainItemTables(const QString& tempItemsPath, QString* error);
+// Merges the staging rows of the temporary items database into the main
+// tables; the tables in emptyFirst (main tables reached through its links)
+// are emptied in the same transaction, so they are replaced whole or not at all.
+bool UpdateMainItemTables(const QString& tempItemsPath, QString* error, const QStringList& emptyFirst = {});
 
 // The price lists offered as the source of the item price.
 struct PriceField {

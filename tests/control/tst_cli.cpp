@@ -1,5 +1,6 @@
 // The headless host as scripts and acceptance checks use it: a real process
 // with a private settings file.
+#include "support/dbrows.h"
 #include "support/erpfixture.h"
 
 #include "localdb/database.h"
@@ -12,6 +13,9 @@
 #include <QTemporaryDir>
 #include <QtTest>
 
+#include <csignal>
+#include <sys/types.h>
+
 namespace {
 struct Run {
     int exitCode = -1;
@@ -20,9 +24,8 @@ struct Run {
 };
 
 // The process inherits the ODBC sandbox, so a demo company registers its data source there.
-Run runCli(const QString& settings, const QStringList& args, const QByteArray& input = {})
+QProcessEnvironment cliEnvironment(const QString& settings)
 {
-    QProcess p;
     QProcessEnvironment env = QProcessEnvironment::systemEnvironment();
     // Keep the user's own folders out of reach.
     const QString home = QFileInfo(settings).absolutePath();
@@ -30,7 +33,13 @@ Run runCli(const QString& settings, const QStringList& args, const QByteArray& i
     env.insert("XDG_CONFIG_HOME", home + "/config");
     env.insert("XDG_DATA_HOME", home + "/data");
     env.remove("TAGORA_SETTINGS");
-    p.setProcessEnvironment(env);
+    return env;
+}
+
+Run runCli(const QString& settings, const QStringList& args, const QByteArray& input = {})
+{
+    QProcess p;
+    p.setProcessEnvironment(cliEnvironment(settings));
     p.start(qEnvironmentVariable("TAGORA_CLI"), QStringList{"--settings", settings} + args);
     if (!input.isEmpty())
         p.write(input);
@@ -245,6 +254,56 @@ private slots:
         // A roll printer: last key first, each with its copies.
         QCOMPARE(sent, QStringList({"2, \"ItemKey\", \"O'R-5\", -9999, -9999", "2, \"3,0\"",
                                     "2, \"ItemKey\", \"AB'12\", -9999, -9999", "2, \"5,0\""}));
+    }
+
+    // "Overwrite the previous scan" replaces the items in one transaction: a
+    // process killed while it reads the new ones leaves the old items with
+    // their marks, and the next import runs as if nothing had happened.
+    void killedCleanImportKeepsItems()
+    {
+        const QString demo = dir.filePath("killed");
+        const QStringList import{"set", "cmbPriceField", "1", "set", "ChkClean", "1", "click", "CmdImportItems"};
+        Run r = runCli(settings(), QStringList{"--demo-items", "20000", "--demo", demo} + import);
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        const QString items = demo + "/data/" + tagora::dbfiles::Items;
+        {
+            tagora::Database d;
+            QVERIFY(!d.open(items));
+            QVERIFY(!d.exec("UPDATE tItems SET PrintLabel = TRUE, Copies = 7 WHERE rowid % 3 = 0"));
+        }
+        const QString kept = "SELECT ItemKey, PrintLabel, Copies FROM tItems ORDER BY 1 COLLATE BINARY";
+        const QStringList before = rows(items, kept);
+        QVERIFY(before.size() > 1000);
+
+        // Killed once the item reader has begun writing: its status line is
+        // out and the items file has a journal, which exists only while a
+        // write transaction is open.
+        QProcess p;
+        p.setProcessEnvironment(cliEnvironment(settings()));
+        p.start(qEnvironmentVariable("TAGORA_CLI"), QStringList{"--settings", settings()} + import);
+        const QString journal = items + "-journal";
+        // "קורא פריטים..." from the command, then the reader's own "קורא פריטים".
+        const QString reading = QString::fromUtf8("קורא פריטים");
+        QString out;
+        bool inReader = false;
+        while (p.state() != QProcess::NotRunning && !(inReader && QFile::exists(journal))) {
+            p.waitForReadyRead(5);
+            out += QString::fromUtf8(p.readAllStandardOutput());
+            const QStringList lines = out.split('\n', Qt::SkipEmptyParts);
+            inReader = !lines.isEmpty() && lines.last().startsWith(reading);
+        }
+        QVERIFY2(p.state() != QProcess::NotRunning, "the import ended before it could be killed");
+        ::kill(pid_t(p.processId()), SIGKILL);
+        p.waitForFinished();
+        QCOMPARE(p.exitStatus(), QProcess::CrashExit);
+        QVERIFY(QFile::exists(journal));
+
+        QCOMPARE(rows(items, kept), before);
+        r = runCli(settings(), import);
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        QCOMPARE(r.out.last(), QString::fromUtf8("הייבוא הסתיים בהצלחה"));
+        QCOMPARE(rows(items, "SELECT count(*), sum(PrintLabel IS TRUE), sum(Copies = 7) FROM tItems"),
+                 QStringList{QString("%1|0|0").arg(before.size())});
     }
 
     // A method with an optional last parameter stops taking arguments at the next verb.

@@ -295,6 +295,28 @@ private slots:
         QCOMPARE(rows(data + "/" + dbfiles::Items, "SELECT ItemKey, Price FROM tItems ORDER BY 1"), expected);
     }
 
+    // A clean import that cannot read the ERP has emptied nothing: the
+    // items and their marks are as they were.
+    void failedCleanImportKeepsItems()
+    {
+        const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
+        QVERIFY(!PrepareDataFolder(data));
+        const QString items = data + "/" + dbfiles::Items;
+        {
+            Database d;
+            QVERIFY(!d.open(items));
+            QVERIFY(!d.exec("INSERT INTO tItems (ItemKey, PrintLabel, Copies) VALUES ('KEPT', TRUE, 4)"));
+        }
+        CardFixture f(QStringLiteral("[Params]\nConnServer=NoSuchSource\nConnType=1\n[GeneralParams]\nDBPath=%1\n")
+                          .arg(data)
+                          .toUtf8());
+        f.c<QCheckBox>("ChkClean")->setChecked(true);
+        const int shown = f.prompt->criticalCount();
+        f.c<QPushButton>("CmdImportItems")->click();
+        QCOMPARE(f.prompt->criticalCount(), shown + 1);
+        QCOMPARE(rows(items, "SELECT ItemKey, PrintLabel, Copies FROM tItems"), QStringList{"KEPT|1|4"});
+    }
+
     void unreachableErp_data()
     {
         QTest::addColumn<QString>("connection");
@@ -356,6 +378,7 @@ private slots:
         QTest::addColumn<bool>("definitionsKept");
         QTest::newRow("plain") << false << false << true << true;
         QTest::newRow("clean items") << true << false << true << true;
+        QTest::newRow("clean alternate keys") << false << true << true << true;
         QTest::newRow("both cleans rebuild") << true << true << true << false;
         QTest::newRow("declined") << true << true << false << true;
     }
@@ -372,7 +395,8 @@ private slots:
             Database d;
             QVERIFY(!d.open(items));
             QVERIFY(!d.exec("INSERT INTO tAccountDef (AccountKey, LabelName) VALUES ('C1', 'x.lbl');"
-                            "INSERT INTO tItems (ItemKey) VALUES ('GONE-FROM-ERP')"));
+                            "INSERT INTO tItems (ItemKey) VALUES ('GONE-FROM-ERP');"
+                            "INSERT INTO tAlterKeys (AccountKey, ItemKey, AlterNum) VALUES ('GONE', 'GONE-FROM-ERP', 'X')"));
         }
         const QByteArray ini = QStringLiteral("[Params]\nConnServer=%1\nConnType=1\n[GeneralParams]\nDBPath=%2\n"
                                               "[ImportItems]\nPriceField=1\nImportAlterKeys=1\nReadPriceList=1\n")
@@ -390,6 +414,7 @@ private slots:
             QCOMPARE(scalar(items, "SELECT count(*) FROM tItems").toInt(), 1);
             return;
         }
+        QCOMPARE(scalar(items, "SELECT count(*) FROM tAlterKeys WHERE AccountKey = 'GONE'").toInt(), cleanAlter ? 0 : 1);
         QCOMPARE(f.card->message(), QString::fromUtf8("הייבוא הסתיים בהצלחה"));
         QCOMPARE(f.card->progress(), 1.0);
         QCOMPARE(scalar(items, "SELECT count(*) FROM tItems WHERE ItemKey = 'GONE-FROM-ERP'").toInt(), cleanItems ? 0 : 1);
