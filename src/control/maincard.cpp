@@ -550,6 +550,12 @@ void MainCard::printLabels(int queryType)
 {
     const short code = GetOLEOption();
     const QString tempDocs = dataFile(dbfiles::TempDocs);
+    // A file whose creation was cut short (an earlier version made files in
+    // place) is completed before the query trusts it.
+    if (DbError error = RepairDataFolder(ui->txtDBPath->text())) {
+        m_services.prompt->critical(titles::Fault, error.message);
+        return;
+    }
     // Labels by items need the documents database only for its links to the
     // item tables; a first run on a new data folder gets the whole folder ready.
     if (queryType == 1 && !QFileInfo::exists(tempDocs)) {
