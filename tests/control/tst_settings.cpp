@@ -277,7 +277,6 @@ private slots:
         {
             CardFixture f(bytes, {}, {"Base price"});
             const QString path = f.settingsPath;
-            QVERIFY(f.store->unreadable());
             f.c<QRadioButton>("OptOLE(3)")->setChecked(true);
             for (const SettingSection& section : settingSections()) {
                 f.card->ClearMessage();
