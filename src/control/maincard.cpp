@@ -392,7 +392,8 @@ void MainCard::SetGetRegPrm(uchar Action, const QString& pRegApp, const QString&
         const auto stored = m_services.settings->value(pRegApp, pRegSection, pParName);
         if (stored && listLacksStored(pObjRef, kind, *stored))
             return;
-        m_services.settings->setValue(pRegApp, pRegSection, pParName, *text);
+        if (!m_services.settings->setValue(pRegApp, pRegSection, pParName, *text))
+            m_saveFailed = true;
     } else if (Action == 2) {
         const auto stored = m_services.settings->value(pRegApp, pRegSection, pParName);
         writeBound(pObjRef, kind, stored ? *stored : variantText(pDefault));
@@ -420,19 +421,31 @@ void MainCard::SetGetRegParams(uchar MySection, uchar Action)
     for (const SettingRow& row : settingRows(MySection))
         SetGetRegPrm(Action, kSettingsApp, section->name, row.key, control(row.control), uchar(row.kind),
                      QVariant(row.defaultText));
-    if (Action == 1)
-        m_services.settings->flush();
+    if (Action == 1 && !m_services.settings->flush())
+        m_saveFailed = true;
 }
 
 void MainCard::cmdSaveDef_Click(int section)
 {
     if (saveBlocked())
         return;
+    // A store that refuses every write (a file it must not rewrite) is not
+    // asked to; the user learns why instead.
+    const QString refusal = m_services.settings->refusal();
+    if (!refusal.isEmpty()) {
+        setMessage(QStringLiteral("שמירת ההגדרות נכשלה: ") + refusal);
+        return;
+    }
+    m_saveFailed = false;
     SetGetRegParams(uchar(section), 1);
     if (section == 1 && control<QRadioButton>(QStringLiteral("OptOLE(3)"))->isChecked())
         SetGetLabelDefs(1);
-    setMessage(m_services.settings->flush() ? QStringLiteral("ההגדרות נשמרו")
-                                            : QStringLiteral("שמירת ההגדרות נכשלה: לא ניתן לכתוב לקובץ ההגדרות"));
+    const bool saved = m_services.settings->flush() && !m_saveFailed;
+    // The file may have been found foreign only now (another program saved it meanwhile).
+    const QString why = m_services.settings->refusal();
+    setMessage(saved ? QStringLiteral("ההגדרות נשמרו")
+                     : QStringLiteral("שמירת ההגדרות נכשלה: ")
+                           + (why.isEmpty() ? QStringLiteral("לא ניתן לכתוב לקובץ ההגדרות") : why));
 }
 
 // ---------------------------------------------------------------- tab and helpers
@@ -537,6 +550,12 @@ void MainCard::printLabels(int queryType)
 {
     const short code = GetOLEOption();
     const QString tempDocs = dataFile(dbfiles::TempDocs);
+    // A file whose creation was cut short (an earlier version made files in
+    // place) is completed before the query trusts it.
+    if (DbError error = RepairDataFolder(ui->txtDBPath->text())) {
+        m_services.prompt->critical(titles::Fault, error.message);
+        return;
+    }
     // Labels by items need the documents database only for its links to the
     // item tables; a first run on a new data folder gets the whole folder ready.
     if (queryType == 1 && !QFileInfo::exists(tempDocs)) {

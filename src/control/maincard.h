@@ -202,6 +202,9 @@ private:
     QString m_currentItemByDocCriteria;
     // Whether this control has read the direct-label layout from the store.
     bool m_layoutLoaded = false;
+    // Set when a write to the settings store failed since the save began, so
+    // the status line never calls a partly failed save done.
+    bool m_saveFailed = false;
 };
 
 } // namespace tagora

@@ -18,9 +18,44 @@
 
 namespace tagora {
 
+namespace {
+// The store as the layout sees it, noting whether any write failed: the
+// layout's own save reports nothing, but the save button must know.
+class NotingStore : public SettingsStore {
+public:
+    NotingStore(SettingsStore& store, bool& failed)
+        : m_store(store)
+        , m_failed(failed)
+    {
+    }
+    std::optional<QString> value(const QString& app, const QString& section, const QString& key) const override
+    {
+        return m_store.value(app, section, key);
+    }
+    bool setValue(const QString& app, const QString& section, const QString& key, const QString& text) override
+    {
+        const bool ok = m_store.setValue(app, section, key, text);
+        m_failed = m_failed || !ok;
+        return ok;
+    }
+    bool flush() override
+    {
+        const bool ok = m_store.flush();
+        m_failed = m_failed || !ok;
+        return ok;
+    }
+    QString refusal() const override { return m_store.refusal(); }
+
+private:
+    SettingsStore& m_store;
+    bool& m_failed;
+};
+} // namespace
+
 void MainCard::SetGetLabelDefs(int action)
 {
-    tagora::SetGetLabelDefs(action, directLabelLayout(), *m_services.settings);
+    NotingStore store(*m_services.settings, m_saveFailed);
+    tagora::SetGetLabelDefs(action, directLabelLayout(), store);
     if (action == 2)
         m_layoutLoaded = true;
 }

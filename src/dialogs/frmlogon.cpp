@@ -57,18 +57,26 @@ void FrmLogon::SetGetRegConnParams(int action)
         {"ConnDataBase", ui->txtConnDatabase}, {"ConnType", ui->CmbConnType}, {"ConnPath", ui->txtConnPath},
     };
     SettingsStore& store = *m_services.settings;
+    // The values still serve this session; the user learns they were not kept.
+    if (action == 1 && !store.refusal().isEmpty()) {
+        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention,
+                                   QStringLiteral("פרטי החיבור לא נשמרו: ") + store.refusal());
+        return;
+    }
+    bool saved = true;
     for (const auto& [key, control] : rows) {
         const BindKind kind = control == ui->CmbConnType ? BindKind::ListIndex : BindKind::Text;
         if (action == 1) {
             if (const auto text = readBound(control, kind))
-                store.setValue(kSettingsApp, kParamsSection, QLatin1String(key), *text);
+                saved = store.setValue(kSettingsApp, kParamsSection, QLatin1String(key), *text) && saved;
         } else if (action == 2) {
             if (const auto text = store.value(kSettingsApp, kParamsSection, QLatin1String(key)))
                 writeBound(control, kind, *text);
         }
     }
-    if (action == 1)
-        store.flush();
+    if (action == 1 && !(store.flush() && saved))
+        m_services.prompt->message(PromptIcon::Exclamation, titles::Attention,
+                                   QStringLiteral("פרטי החיבור לא נשמרו: לא ניתן לכתוב לקובץ ההגדרות"));
 }
 
 void FrmLogon::CmdCheck_Click()

@@ -11,7 +11,17 @@
 #include <QFileInfo>
 #include <QSaveFile>
 #include <QSet>
+#include <QRegularExpression>
+#include <QStandardPaths>
 #include <QStringEncoder>
+
+#ifdef Q_OS_UNIX
+#include <cerrno>
+#include <dirent.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#endif
 
 namespace tagora {
 
@@ -171,23 +181,119 @@ QString cellPercent(int count)
 QString directJobFolder()
 {
     QString temp = qEnvironmentVariable("Temp");
+#ifdef Q_OS_UNIX
+    // The system's temporary folder is shared by every user here: a name
+    // planted in it could turn our clean-up against someone else's files, or
+    // swap the page before the browser reads it. A folder of the user's own
+    // serves instead.
+    if (temp.isEmpty()) {
+        temp = qEnvironmentVariable("XDG_RUNTIME_DIR");
+        if (temp.isEmpty())
+            temp = QDir(QStandardPaths::writableLocation(QStandardPaths::GenericCacheLocation))
+                       .filePath(QStringLiteral("tagora"));
+    }
+#else
     if (temp.isEmpty())
         temp = QDir::tempPath();
+#endif
     return QDir(temp).filePath(QStringLiteral("tgrlab"));
 }
 
+namespace {
+// What a job leaves in the folder: the page and the barcode pictures named by
+// field and record (B0400012.BMP). Nothing else there is ours to remove.
+bool isJobFile(const QString& name)
+{
+    static const QRegularExpression picture(QStringLiteral("^B[0-9]{7,}\\.BMP$"));
+    return name == QLatin1String("tgrlab1.htm") || picture.match(name).hasMatch();
+}
+
+#ifdef Q_OS_UNIX
+// The folder as it stands, not what a link there points to: ours, a folder,
+// writable by nobody else. Empty text when it is.
+QString unsafeJobFolder(const QString& folder, const struct stat& st)
+{
+    const QString shown = QDir::toNativeSeparators(folder);
+    if (S_ISLNK(st.st_mode))
+        return QStringLiteral("תיקיית העבודה '%1' היא קישור לתיקייה אחרת; ההדפסה לא תיכתב דרכו").arg(shown);
+    if (!S_ISDIR(st.st_mode))
+        return QStringLiteral("'%1' אינו תיקייה, ולכן לא ניתן להשתמש בו כתיקיית העבודה").arg(shown);
+    if (st.st_uid != geteuid())
+        return QStringLiteral("תיקיית העבודה '%1' שייכת למשתמש אחר; ההדפסה לא תיכתב בה").arg(shown);
+    if (st.st_mode & (S_IWGRP | S_IWOTH))
+        return QStringLiteral("תיקיית העבודה '%1' פתוחה לכתיבה למשתמשים אחרים; ההדפסה לא תיכתב בה").arg(shown);
+    return QString();
+}
+#endif
+} // namespace
+
 QString PrepareJobFolder(const QString& folder)
 {
-    QDir dir(folder);
-    if (!dir.exists()) {
-        if (!QDir().mkpath(folder))
-            return QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(QDir::toNativeSeparators(folder));
-        return QString();
+    const QString shown = QDir::toNativeSeparators(folder);
+    const QString parent = QFileInfo(folder).absolutePath();
+    if (!QDir().mkpath(parent))
+        return QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(QDir::toNativeSeparators(parent));
+#ifdef Q_OS_UNIX
+    const QByteArray native = QFile::encodeName(folder);
+    // Made private from the start, and then taken only as it stands: a link
+    // planted under the name is refused, never followed.
+    if (::mkdir(native.constData(), 0700) != 0 && errno != EEXIST)
+        return QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(shown);
+    const int fd = ::open(native.constData(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC);
+    struct stat st {};
+    if (fd < 0) {
+        if (::lstat(native.constData(), &st) == 0) {
+            const QString why = unsafeJobFolder(folder, st);
+            if (!why.isEmpty())
+                return why;
+        }
+        return QStringLiteral("לא ניתן לפתוח את תיקיית העבודה '%1'").arg(shown);
     }
-    for (const QString& name : dir.entryList(QDir::Files | QDir::Hidden | QDir::System))
-        if (!dir.remove(name))
-            return QStringLiteral("לא ניתן למחוק את הקובץ '%1'").arg(QDir::toNativeSeparators(dir.filePath(name)));
+    if (::fstat(fd, &st) != 0) {
+        ::close(fd);
+        return QStringLiteral("לא ניתן לפתוח את תיקיית העבודה '%1'").arg(shown);
+    }
+    if (const QString why = unsafeJobFolder(folder, st); !why.isEmpty()) {
+        ::close(fd);
+        return why;
+    }
+    // Names are removed relative to the folder we checked, and a link is
+    // removed as a link: nothing outside the folder is ever reached.
+    DIR* entries = ::fdopendir(::dup(fd));
+    QString error;
+    if (!entries)
+        error = QStringLiteral("לא ניתן לקרוא את תיקיית העבודה '%1'").arg(shown);
+    while (entries && error.isEmpty()) {
+        const dirent* entry = ::readdir(entries);
+        if (!entry)
+            break;
+        const QString name = QFile::decodeName(entry->d_name);
+        if (!isJobFile(name))
+            continue;
+        struct stat item {};
+        if (::fstatat(fd, entry->d_name, &item, AT_SYMLINK_NOFOLLOW) != 0 || S_ISDIR(item.st_mode))
+            continue;
+        if (::unlinkat(fd, entry->d_name, 0) != 0 && errno != ENOENT)
+            error = QStringLiteral("לא ניתן למחוק את הקובץ '%1'").arg(QDir::toNativeSeparators(QDir(folder).filePath(name)));
+    }
+    if (entries)
+        ::closedir(entries);
+    ::close(fd);
+    return error;
+#else
+    QDir dir(folder);
+    if (!dir.exists() && !QDir().mkpath(folder))
+        return QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(shown);
+    if (QFileInfo(folder).isSymLink())
+        return QStringLiteral("תיקיית העבודה '%1' היא קישור לתיקייה אחרת; ההדפסה לא תיכתב דרכו").arg(shown);
+    for (const QFileInfo& entry : dir.entryInfoList(QDir::Files | QDir::Hidden | QDir::System)) {
+        if (!isJobFile(entry.fileName()))
+            continue;
+        if (!dir.remove(entry.fileName()))
+            return QStringLiteral("לא ניתן למחוק את הקובץ '%1'").arg(QDir::toNativeSeparators(entry.filePath()));
+    }
     return QString();
+#endif
 }
 
 QString MakeBarcodeImages(const QString& folder, const QString& column, int fieldIndex, const QString& dbPath,

@@ -12,10 +12,15 @@ namespace tagora {
 class ProgressSink;
 class BarcodeLibrary;
 
-// The folder of a direct-label job: the temporary folder ("Temp" when set)
-// followed by "tgrlab".
+// The folder of a direct-label job: "Temp" followed by "tgrlab" when that
+// variable is set; otherwise "tgrlab" in a folder of the user's own
+// ($XDG_RUNTIME_DIR, else the user's cache folder; the temporary folder on
+// Windows, which is the user's own there).
 QString directJobFolder();
-// Empties (or makes) the job folder; empty text on success.
+// Makes the job folder (mode 0700) or takes it as it stands: a link, a folder
+// of another user or one others may write to is refused with the reason.
+// Then removes what earlier jobs left there (the page and the barcode
+// pictures), and nothing else. Empty text on success.
 QString PrepareJobFolder(const QString& folder);
 
 // A record whose barcode the symbology cannot encode: it gets no picture.

@@ -2,12 +2,26 @@
 
 #include "platform/platformdefaults.h"
 
+#include <QCoreApplication>
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
 #include <QRegularExpression>
+#include <QSysInfo>
 
 #include <algorithm>
+#include <filesystem>
+#include <functional>
+#include <optional>
+#include <system_error>
+
+#ifdef Q_OS_UNIX
+#include <cerrno>
+#include <csignal>
+#include <unistd.h>
+#elif defined(Q_OS_WIN)
+#include <windows.h>
+#endif
 
 namespace tagora {
 
@@ -156,31 +170,152 @@ bool removeDatabaseFile(const QString& path, DbError* error)
     return true;
 }
 
-// Runs the creation steps in order; stops at the first error, leaving what
-// was made so far, as the next creation starts by deleting the file anyway.
+// ---- Files built aside.
+//
+// A file is built under a name of its own beside the target and takes the
+// target's name only when whole, so a run killed half way leaves the target
+// as it was (or missing), never a file that looks usable and lacks tables.
+// The name says which file, on which machine and in which process, so the
+// next run can tell a leftover of a dead process from a build another
+// instance has under way: "tgrrtdb.tmp.building-host-1234".
+
+const QString kBuilding = QStringLiteral(".building-");
+
+QString thisHost()
+{
+    QString host = QSysInfo::machineHostName();
+    for (QChar& c : host)
+        if (!(c.isLetterOrNumber() && c.unicode() < 128))
+            c = QLatin1Char('_');
+    return host.isEmpty() ? QStringLiteral("_") : host;
+}
+
+} // namespace
+
+QString BuildingPath(const QString& target)
+{
+    return target + kBuilding + thisHost() + QLatin1Char('-') + QString::number(QCoreApplication::applicationPid());
+}
+
+namespace {
+
+bool processRunning(qint64 pid)
+{
+#ifdef Q_OS_UNIX
+    return ::kill(pid_t(pid), 0) == 0 || errno == EPERM;
+#elif defined(Q_OS_WIN)
+    HANDLE process = OpenProcess(PROCESS_QUERY_LIMITED_INFORMATION, FALSE, DWORD(pid));
+    if (!process)
+        return GetLastError() == ERROR_ACCESS_DENIED;
+    DWORD code = 0;
+    const bool running = GetExitCodeProcess(process, &code) && code == STILL_ACTIVE;
+    CloseHandle(process);
+    return running;
+#else
+    Q_UNUSED(pid);
+    return true;
+#endif
+}
+
+// Puts a whole file in place of the target, replacing what is there. The
+// target's own journal goes first: left from a crash, it would be played
+// back into the new file.
+DbError moveIntoPlace(const QString& building, const QString& target)
+{
+    for (const QString& suffix : {QStringLiteral("-journal"), QStringLiteral("-wal"), QStringLiteral("-shm")})
+        QFile::remove(target + suffix);
+    // Unlike QFile::rename, this replaces the target in one step.
+#ifdef Q_OS_WIN
+    const std::filesystem::path from(building.toStdWString()), to(target.toStdWString());
+#else
+    const std::filesystem::path from(QFile::encodeName(building).toStdString()), to(QFile::encodeName(target).toStdString());
+#endif
+    std::error_code ec;
+    std::filesystem::rename(from, to, ec);
+    if (ec)
+        return DbError::other(QStringLiteral("לא ניתן להעביר את בסיס הנתונים אל '%1': %2")
+                                  .arg(QDir::toNativeSeparators(target), QString::fromLocal8Bit(ec.message().c_str())));
+    return {};
+}
+
+// Runs the creation steps in order on a file aside and moves it into place
+// when whole; finish, when given, adds what the caller's file needs before
+// that. On an error the file aside is removed and the target stays as it was.
 QString createDatabase(const QString& path, const std::vector<TableDef>& tables,
                        const std::vector<std::pair<QString, QString>>& links,
-                       const std::vector<std::pair<const char*, const char*>>& queries, DbError* error)
+                       const std::vector<std::pair<const char*, const char*>>& queries, DbError* error,
+                       const std::function<DbError(Database&)>& finish = {})
 {
     DbError local;
     DbError& e = error ? *error : local;
     e = {};
-    if (!removeDatabaseFile(path, &e))
+    const QString building = BuildingPath(path);
+    if (!removeDatabaseFile(building, &e))
         return QString();
-    Database db;
-    if ((e = db.open(path, Database::OpenMode::Create)))
+    {
+        Database db;
+        auto made = [&]() -> DbError {
+            if (DbError f = db.open(building, Database::OpenMode::Create))
+                return f;
+            for (const TableDef& t : tables)
+                if (DbError f = db.exec(createTableSql(t)))
+                    return f;
+            for (const auto& [source, table] : links)
+                if (DbError f = AttachTable(db, source, table))
+                    return f;
+            for (const auto& [name, sql] : queries)
+                if (DbError f = db.createQuery(QLatin1String(name), QString::fromUtf8(sql)))
+                    return f;
+            if (finish)
+                return finish(db);
+            return {};
+        };
+        e = made();
+    }
+    if (!e)
+        e = moveIntoPlace(building, path);
+    if (e) {
+        removeDatabaseFile(building, nullptr);
         return QString();
-    for (const TableDef& t : tables)
-        if ((e = db.exec(createTableSql(t))))
-            return QString();
-    for (const auto& [source, table] : links)
-        if ((e = AttachTable(db, source, table)))
-            return QString();
-    for (const auto& [name, sql] : queries)
-        if ((e = db.createQuery(QLatin1String(name), QString::fromUtf8(sql))))
-            return QString();
-    db.close();
+    }
     return path;
+}
+
+DbError addUpgradeColumns(Database& db)
+{
+    for (const char* column : {"FldID SMALLINT", "FldMaxLen SMALLINT", "Label2Name TEXT(50)"})
+        if (DbError e = db.exec(QStringLiteral("ALTER TABLE tAccountDef ADD COLUMN %1").arg(QLatin1String(column))))
+            return e;
+    return {};
+}
+
+// What one of the files the system makes must hold to be used: its own
+// tables, and in its catalog its links and stored queries.
+struct FileSchema {
+    const std::vector<TableDef>* tables;
+    std::vector<std::pair<QString, QString>> links; // table -> file name of its source in the data folder
+    const std::vector<std::pair<const char*, const char*>>* queries;
+};
+
+std::optional<FileSchema> schemaOf(const QString& fileName)
+{
+    if (fileName.compare(dbfiles::Items, Qt::CaseInsensitive) == 0)
+        return FileSchema{&itemsTables(), {}, &itemsQueries()};
+    if (fileName.compare(dbfiles::TempDocs, Qt::CaseInsensitive) == 0) {
+        FileSchema f{&tempDocsTables(), {}, &tempDocsQueries()};
+        for (const char* t : {"tDocTypes", "tCSTable", "tCurrencies", "tWizFiles", "tWizFileRanges"})
+            f.links.emplace_back(QLatin1String(t), dbfiles::Config);
+        for (const char* t : {"tItems", "tAlterKeys", "tAlterPrices", "tPriceList", "tAccountDef"})
+            f.links.emplace_back(QLatin1String(t), dbfiles::Items);
+        return f;
+    }
+    if (fileName.compare(dbfiles::TempItems, Qt::CaseInsensitive) == 0) {
+        FileSchema f{&tempItemsTables(), {}, &tempItemsQueries()};
+        for (const char* t : {"tItems", "tAlterKeys", "tAlterPrices", "tPriceList"})
+            f.links.emplace_back(QLatin1String(t), dbfiles::Items);
+        return f;
+    }
+    return std::nullopt;
 }
 
 // A CREATE TABLE text in its parts: the column and table-constraint
@@ -543,15 +678,19 @@ DbError AttachTable(Database& db, const QString& sourcePath, const QString& tabl
     return db.attachTable(sourcePath, table);
 }
 
+static std::vector<std::pair<QString, QString>> tempDocsLinks(const QString& configPath, const QString& itemsPath)
+{
+    std::vector<std::pair<QString, QString>> links;
+    const FileSchema schema = *schemaOf(dbfiles::TempDocs);
+    for (const auto& [table, file] : schema.links)
+        links.emplace_back(file == dbfiles::Config ? configPath : itemsPath, table);
+    return links;
+}
+
 QString CreateTempDocsDB(const QString& configPath, const QString& itemsPath, const QString& tempDocsPath,
                          DbError* error)
 {
-    std::vector<std::pair<QString, QString>> links;
-    for (const char* t : {"tDocTypes", "tCSTable", "tCurrencies", "tWizFiles", "tWizFileRanges"})
-        links.emplace_back(configPath, QLatin1String(t));
-    for (const char* t : {"tItems", "tAlterKeys", "tAlterPrices", "tPriceList", "tAccountDef"})
-        links.emplace_back(itemsPath, QLatin1String(t));
-    return createDatabase(tempDocsPath, tempDocsTables(), links, tempDocsQueries(), error);
+    return createDatabase(tempDocsPath, tempDocsTables(), tempDocsLinks(configPath, itemsPath), tempDocsQueries(), error);
 }
 
 QString CreateItemsDB(const QString& itemsPath, DbError* error)
@@ -562,9 +701,151 @@ QString CreateItemsDB(const QString& itemsPath, DbError* error)
 QString CreateTempItemsDB(const QString& tempItemsPath, const QString& itemsPath, DbError* error)
 {
     std::vector<std::pair<QString, QString>> links;
-    for (const char* t : {"tItems", "tAlterKeys", "tAlterPrices", "tPriceList"})
-        links.emplace_back(itemsPath, QLatin1String(t));
+    const FileSchema schema = *schemaOf(dbfiles::TempItems);
+    for (const auto& [table, file] : schema.links)
+        links.emplace_back(itemsPath, table);
     return createDatabase(tempItemsPath, tempItemsTables(), links, tempItemsQueries(), error);
+}
+
+QStringList MissingObjects(const QString& path, DbError* error)
+{
+    DbError local;
+    DbError& e = error ? *error : local;
+    e = {};
+    const auto schema = schemaOf(QFileInfo(path).fileName());
+    if (!schema || !QFileInfo::exists(path))
+        return {};
+    Database db;
+    if ((e = db.open(path, Database::OpenMode::ReadOnly)))
+        return {};
+    QStringList have;
+    Statement tables = db.prepare(QStringLiteral("SELECT name FROM main.sqlite_master WHERE type = 'table'"), &e);
+    while (!e && tables.step() == Statement::Step::Row)
+        have << tables.value(0).toString().toLower();
+    if (e)
+        return {};
+    QStringList catalog;
+    if (have.contains(kCatalogTable.toLower())) {
+        Statement rows = db.prepare(QStringLiteral("SELECT Name, Kind FROM main.%1").arg(kCatalogTable), &e);
+        while (!e && rows.step() == Statement::Step::Row)
+            catalog << (rows.value(1).toString() == QLatin1String("link") ? QStringLiteral("link:") : QStringLiteral("query:"))
+                           + rows.value(0).toString().toLower();
+        if (e)
+            return {};
+    }
+    QStringList missing;
+    for (const TableDef& t : *schema->tables)
+        if (!have.contains(QString::fromLatin1(t.name).toLower()))
+            missing << QLatin1String(t.name);
+    for (const auto& [table, file] : schema->links)
+        if (!catalog.contains(QStringLiteral("link:") + table.toLower()))
+            missing << table;
+    for (const auto& [name, sql] : *schema->queries)
+        if (!catalog.contains(QStringLiteral("query:") + QString::fromLatin1(name).toLower()))
+            missing << QLatin1String(name);
+    return missing;
+}
+
+DbError CompleteDatabase(const QString& path, QStringList* added)
+{
+    if (added)
+        added->clear();
+    const auto schema = schemaOf(QFileInfo(path).fileName());
+    if (!schema)
+        return DbError::other(QStringLiteral("'%1' אינו אחד מבסיסי הנתונים של המערכת").arg(QDir::toNativeSeparators(path)));
+    DbError e;
+    const QStringList missing = MissingObjects(path, &e);
+    if (e || missing.isEmpty())
+        return e;
+    const QString folder = QFileInfo(path).absolutePath();
+    // A file lacking links was stopped before its rows could come (they come
+    // only after a whole creation), and links cannot be added inside a
+    // transaction: such a file is built again, aside.
+    for (const auto& [table, file] : schema->links) {
+        if (!missing.contains(table))
+            continue;
+        const QString items = joinDataPath(folder, dbfiles::Items);
+        const QString made = QFileInfo(path).fileName().compare(dbfiles::TempDocs, Qt::CaseInsensitive) == 0
+                                 ? CreateTempDocsDB(joinDataPath(folder, dbfiles::Config), items, path, &e)
+                                 : CreateTempItemsDB(path, items, &e);
+        if (!made.isEmpty() && added)
+            *added = missing;
+        return e;
+    }
+    Database db;
+    if ((e = db.open(path)))
+        return e;
+    // All or nothing, so a run stopped here leaves the file as it found it.
+    Transaction tx(db);
+    if ((e = tx.error()))
+        return e;
+    for (const TableDef& t : *schema->tables) {
+        if (!missing.contains(QLatin1String(t.name)))
+            continue;
+        if ((e = db.exec(createTableSql(t))))
+            return e;
+        // The items database is made upgraded by everything that makes it.
+        if (qstrcmp(t.name, "tAccountDef") == 0 && (e = addUpgradeColumns(db)))
+            return e;
+    }
+    for (const auto& [name, sql] : *schema->queries)
+        if (missing.contains(QLatin1String(name)) && (e = db.createQuery(QLatin1String(name), QString::fromUtf8(sql))))
+            return e;
+    if ((e = tx.commit()))
+        return e;
+    if (added)
+        *added = missing;
+    return {};
+}
+
+QStringList RemoveLeftoverBuilds(const QString& folder)
+{
+    static const QRegularExpression leftover(
+        QStringLiteral("^(tagora\\.tdb|tgrmitm\\.tdb|tgrrtdb\\.tmp|tgrlabti\\.tmp)\\.building-([A-Za-z0-9_]+)-([0-9]+)"
+                       "(-journal|-wal|-shm)?$"),
+        QRegularExpression::CaseInsensitiveOption);
+    QStringList removed;
+    QDir dir(folder);
+    const QString host = thisHost();
+    for (const QFileInfo& entry : dir.entryInfoList(QDir::Files | QDir::Hidden | QDir::System)) {
+        // The copy of the supplied configuration was made under this name before.
+        const bool oldCopy = entry.fileName().compare(dbfiles::Config + QStringLiteral(".new"), Qt::CaseInsensitive) == 0;
+        const QRegularExpressionMatch m = leftover.match(entry.fileName());
+        if (!oldCopy && !m.hasMatch())
+            continue;
+        if (entry.isSymLink())
+            continue;
+        // A build of another machine, or of a process still running here, is not a leftover.
+        if (m.hasMatch() && (m.captured(2) != host || processRunning(m.captured(3).toLongLong())))
+            continue;
+        if (dir.remove(entry.fileName()))
+            removed << entry.fileName();
+    }
+    return removed;
+}
+
+DbError RepairDataFolder(const QString& folder, QStringList* repaired)
+{
+    if (repaired)
+        repaired->clear();
+    if (!QFileInfo(folder).isDir())
+        return {};
+    RemoveLeftoverBuilds(folder);
+    // The items database first: the documents database links to its tables.
+    for (const QString& name : {dbfiles::Items, dbfiles::TempDocs, dbfiles::TempItems}) {
+        const QString path = joinDataPath(folder, name);
+        if (!QFileInfo::exists(path))
+            continue;
+        QStringList added;
+        if (DbError e = CompleteDatabase(path, &added)) {
+            e.message = QStringLiteral("בסיס הנתונים '%1' לא נוצר עד סופו, ולא ניתן להשלים אותו: %2")
+                            .arg(QDir::toNativeSeparators(path), e.message);
+            return e;
+        }
+        if (repaired && !added.isEmpty())
+            *repaired << name;
+    }
+    return {};
 }
 
 QString UpgradeAccountDef(const QString& itemsPath, DbError* error)
@@ -583,9 +864,8 @@ QString UpgradeAccountDef(const QString& itemsPath, DbError* error)
     Transaction tx(db);
     if ((e = tx.error()))
         return QString();
-    for (const char* column : {"FldID SMALLINT", "FldMaxLen SMALLINT", "Label2Name TEXT(50)"})
-        if ((e = db.exec(QStringLiteral("ALTER TABLE tAccountDef ADD COLUMN %1").arg(QLatin1String(column)))))
-            return QString();
+    if ((e = addUpgradeColumns(db)))
+        return QString();
     if ((e = tx.commit()))
         return QString();
     db.close();
@@ -654,12 +934,21 @@ DbError InstallConfigDatabase(const QString& path)
     QFile supplied(QStringLiteral(":/tagora/tagora.tdb"));
     if (!supplied.exists())
         return DbError::other(QStringLiteral("בסיס נתוני ההגדרות חסר בגרסה זו"));
-    // Copy beside the target and move into place, so a failure leaves no half file.
-    const QString building = path + QStringLiteral(".new");
+    // Copied aside, on the disk, and only then moved into place: a failure
+    // or a killed run leaves no half file under the name.
+    const QString building = BuildingPath(path);
     QFile::remove(building);
-    if (!supplied.copy(building)
-        || !QFile::setPermissions(building, QFile::ReadOwner | QFile::WriteOwner | QFile::ReadGroup | QFile::ReadOther)
-        || !QFile::rename(building, path)) {
+    bool ok = supplied.copy(building)
+              && QFile::setPermissions(building, QFile::ReadOwner | QFile::WriteOwner | QFile::ReadGroup | QFile::ReadOther);
+    if (ok) {
+        QFile copy(building);
+        ok = copy.open(QIODevice::ReadWrite);
+#ifdef Q_OS_UNIX
+        ok = ok && ::fsync(copy.handle()) == 0;
+#endif
+    }
+    // The name is taken only when free: a file another run put there meanwhile stays.
+    if (!ok || !QFile::rename(building, path)) {
         QFile::remove(building);
         return DbError::other(QStringLiteral("לא ניתן ליצור את הקובץ '%1'").arg(QDir::toNativeSeparators(path)));
     }
@@ -670,14 +959,17 @@ DbError PrepareDataFolder(const QString& folder)
 {
     if (!QDir().mkpath(folder))
         return DbError::other(QStringLiteral("לא ניתן ליצור את התיקייה '%1'").arg(QDir::toNativeSeparators(folder)));
+    if (DbError e = RepairDataFolder(folder))
+        return e;
     const QString config = joinDataPath(folder, dbfiles::Config);
     if (!QFileInfo::exists(config))
         if (DbError e = InstallConfigDatabase(config))
             return e;
     const QString items = joinDataPath(folder, dbfiles::Items);
     if (!QFileInfo::exists(items)) {
+        // Upgraded before it takes its name, so no run finds it half made.
         DbError e;
-        if (CreateItemsDB(items, &e).isEmpty() || UpgradeAccountDef(items, &e).isEmpty())
+        if (createDatabase(items, itemsTables(), {}, itemsQueries(), &e, addUpgradeColumns).isEmpty())
             return e;
     }
     return {};

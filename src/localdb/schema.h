@@ -49,8 +49,13 @@ const std::vector<TableDef>& tempDocsTables();
 const std::vector<TableDef>& itemsTables();
 const std::vector<TableDef>& tempItemsTables();
 
-// Builds each file from nothing: an existing file at the path is deleted
-// first. Returns the path, or empty text with the engine's error.
+// Builds each file from nothing, aside (under the target's name followed by
+// ".building-HOST-PID"), and puts it in place of the file at the path only
+// when whole: a failure, or a run killed half way, leaves the earlier file
+// (or none). Returns the path, or empty text with the engine's error.
+// The name a file is built under beside target by this process.
+QString BuildingPath(const QString& target);
+
 QString CreateTempDocsDB(const QString& configPath, const QString& itemsPath, const QString& tempDocsPath,
                          DbError* error);
 QString CreateItemsDB(const QString& itemsPath, DbError* error);
@@ -80,9 +85,34 @@ DbError UpgradeCaselessKeys(const QString& path, CaselessKeysReport* report = nu
 // Links a table of another file into the open database under its own name.
 DbError AttachTable(Database& db, const QString& sourcePath, const QString& table);
 
-// Makes the data folder ready for a first run: the folder, the supplied
-// configuration database and an empty (upgraded) items database, each only
-// when missing. Nothing that exists is touched.
+// What a file of the system lacks of its schema: own tables, and links and
+// stored queries in its catalog, by name. Decided by the file's name
+// (tgrmitm.tdb, tgrrtdb.tmp, tgrlabti.tmp); empty for a complete file, a
+// missing one or another name. A file that cannot be read gives the error.
+QStringList MissingObjects(const QString& path, DbError* error = nullptr);
+
+// Completes such a file. Missing tables (tAccountDef with its upgrade
+// fields) and stored queries are made in place, in one transaction, and the
+// rows the file holds stay. A file lacking links (a temporary database whose
+// creation stopped before its rows could come) is built again aside, linked
+// to the files of the data folder it lies in. added receives what was
+// missing.
+DbError CompleteDatabase(const QString& path, QStringList* added = nullptr);
+
+// Removes what a killed build left in the folder: files aside of the four
+// databases (and their journals) whose process, on this machine, is gone.
+// Builds of a running process or of another machine, and every other file,
+// stay. Returns the names removed.
+QStringList RemoveLeftoverBuilds(const QString& folder);
+
+// Before a data folder is used: leftover builds removed, and each database
+// of the folder that lacks part of its schema completed (repaired receives
+// their names). Missing files are not made here.
+DbError RepairDataFolder(const QString& folder, QStringList* repaired = nullptr);
+
+// Makes the data folder ready for a first run: the folder, then the repair
+// above, then the supplied configuration database and an empty (upgraded)
+// items database, each only when missing. Nothing complete is touched.
 DbError PrepareDataFolder(const QString& folder);
 
 // Writes the supplied configuration database to path (which must not exist).

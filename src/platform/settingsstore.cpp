@@ -1,11 +1,13 @@
 #include "platform/settingsstore.h"
 
 #include <QByteArrayView>
+#include <QDateTime>
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
 #include <QSettings>
 #include <QStandardPaths>
+#include <QStringDecoder>
 #include <QStringList>
 
 namespace tagora {
@@ -209,6 +211,32 @@ std::optional<QString> typedIniValue(const QString& path, const QString& wanted)
     }
     return found ? found : foundAnyCase;
 }
+
+// Why a settings file must not be rewritten: it is not the UTF-8 text this
+// store writes. QSettings reads other bytes as replacement characters and
+// would save those in their place. Empty text for a file that may be
+// rewritten, or for none.
+QString foreignFile(const QString& path)
+{
+    if (!QFileInfo::exists(path))
+        return QString();
+    const QString shown = QDir::toNativeSeparators(QFileInfo(path).absoluteFilePath());
+    QFile file(path);
+    if (!file.open(QIODevice::ReadOnly))
+        return QStringLiteral("לא ניתן לקרוא את קובץ ההגדרות '%1'").arg(shown);
+    const QByteArray bytes = file.readAll();
+    if (bytes.contains('\0'))
+        return QStringLiteral("קובץ ההגדרות '%1' אינו קובץ טקסט (יש בו תווים בינאריים); הוא לא ישוכתב כדי שתוכנו "
+                              "לא יאבד")
+            .arg(shown);
+    QStringDecoder utf8(QStringDecoder::Utf8, QStringDecoder::Flag::Stateless);
+    const QString text = utf8.decode(bytes);
+    if (utf8.hasError())
+        return QStringLiteral("קובץ ההגדרות '%1' אינו כתוב בקידוד UTF-8 (ייתכן שנשמר בקידוד Windows-1255); הוא לא "
+                              "ישוכתב כדי שתוכנו לא יאבד. יש לשמור אותו מחדש בקידוד UTF-8")
+            .arg(shown);
+    return QString();
+}
 } // namespace
 
 IniSettingsStore::IniSettingsStore(const QString& path)
@@ -217,8 +245,29 @@ IniSettingsStore::IniSettingsStore(const QString& path)
     const QFileInfo info(path);
     if (!info.dir().exists())
         QDir().mkpath(info.absolutePath());
+    m_refusal = foreignFile(path);
     m_settings = std::make_unique<QSettings>(path, QSettings::IniFormat);
-    m_unreadable = info.exists() && m_settings->status() != QSettings::NoError;
+    if (m_refusal.isEmpty() && info.exists() && m_settings->status() != QSettings::NoError)
+        m_refusal = QStringLiteral("קובץ ההגדרות '%1' אינו קובץ הגדרות תקין; הוא לא ישוכתב כדי שתוכנו לא יאבד")
+                        .arg(QDir::toNativeSeparators(info.absoluteFilePath()));
+    m_unreadable = !m_refusal.isEmpty();
+    m_checked = info.exists() ? std::make_pair(info.lastModified(), info.size()) : std::make_pair(QDateTime(), qint64(-1));
+}
+
+bool IniSettingsStore::stillOurs()
+{
+    if (m_unreadable)
+        return false;
+    // Another program may have saved the file since it was read; QSettings
+    // merges that file into what it writes, so it is judged again.
+    const QFileInfo info(m_path);
+    const auto now = info.exists() ? std::make_pair(info.lastModified(), info.size()) : std::make_pair(QDateTime(), qint64(-1));
+    if (now == m_checked)
+        return true;
+    m_checked = now;
+    m_refusal = foreignFile(m_path);
+    m_unreadable = !m_refusal.isEmpty();
+    return !m_unreadable;
 }
 
 IniSettingsStore::~IniSettingsStore()
@@ -249,7 +298,7 @@ std::optional<QString> IniSettingsStore::value(const QString& app, const QString
 
 bool IniSettingsStore::setValue(const QString& app, const QString& section, const QString& key, const QString& text)
 {
-    if (m_unreadable)
+    if (!stillOurs())
         return false;
     m_settings->setValue(groupKey(app, section, key), text);
     return true;
@@ -257,7 +306,7 @@ bool IniSettingsStore::setValue(const QString& app, const QString& section, cons
 
 bool IniSettingsStore::flush()
 {
-    if (m_unreadable)
+    if (!stillOurs())
         return false;
     m_settings->sync();
     return m_settings->status() == QSettings::NoError;

@@ -1,8 +1,10 @@
 #pragma once
 
+#include <QDateTime>
 #include <QString>
 #include <memory>
 #include <optional>
+#include <utility>
 
 class QSettings;
 
@@ -22,6 +24,8 @@ public:
     virtual bool setValue(const QString& app, const QString& section, const QString& key, const QString& text) = 0;
     // Push pending writes to the medium; false when that failed.
     virtual bool flush() { return true; }
+    // Why the store takes no writes at all, in Hebrew; empty when it does.
+    virtual QString refusal() const { return QString(); }
 };
 
 // An INI file: one group per section of the application "Tagora" (what an
@@ -37,16 +41,24 @@ public:
     bool flush() override;
 
     QString path() const { return m_path; }
-    // True when the file exists but could not be read as INI text; such a
-    // file is never written back, so a hand-made file is not lost to a save.
+    // True when the file exists but is not the UTF-8 INI text this store
+    // writes (another code page, binary bytes, or text QSettings cannot
+    // parse): such a file is never written back, as a save would replace
+    // what it cannot read with replacement characters.
     bool unreadable() const { return m_unreadable; }
+    QString refusal() const override { return m_refusal; }
 
 private:
     QString groupKey(const QString& app, const QString& section, const QString& key) const;
+    // False once the file is found not to be ours to rewrite.
+    bool stillOurs();
 
     QString m_path;
     std::unique_ptr<QSettings> m_settings;
     bool m_unreadable = false;
+    QString m_refusal;
+    std::pair<QDateTime, qint64> m_checked; // the file as last judged: time and size
+
 };
 
 #ifdef Q_OS_WIN

@@ -55,6 +55,8 @@ Run runCli(const QString& settings, const QStringList& args, const QByteArray& i
 }
 } // namespace
 
+using namespace tagora;
+
 class TestCli : public QObject {
     Q_OBJECT
     QTemporaryDir dir;
@@ -304,6 +306,68 @@ private slots:
         QCOMPARE(r.out.last(), QString::fromUtf8("הייבוא הסתיים בהצלחה"));
         QCOMPARE(rows(items, "SELECT count(*), sum(PrintLabel IS TRUE), sum(Copies = 7) FROM tItems"),
                  QStringList{QString("%1|0|0").arg(before.size())});
+    }
+
+    // A print killed (kill -9) while it creates the documents database: the
+    // file being built lies aside, so the next run finds no half file under
+    // the name, removes the leftover, builds the file whole and prints.
+    void killedCreationIsRebuilt()
+    {
+        const QString data = dir.filePath("killedcreation");
+        QVERIFY(!PrepareDataFolder(data));
+        const QString items = data + "/" + dbfiles::Items;
+        {
+            Database db;
+            QVERIFY(!db.open(items));
+            QVERIFY(!db.exec("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('K1', 'Bolt', 2, TRUE)"));
+        }
+        const QString journal = dir.filePath("killed-journal.txt");
+        {
+            QFile f(settings());
+            QVERIFY(f.open(QIODevice::WriteOnly));
+            f.write(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n[LabelVars]\n00FldSend=1\n")
+                        .arg(journal, data)
+                        .toUtf8());
+        }
+        // The configuration held locked stops the creation at its first link,
+        // after its tables: there the process is killed.
+        Database config;
+        QVERIFY(!config.open(data + "/" + dbfiles::Config));
+        QVERIFY(!config.exec("BEGIN EXCLUSIVE"));
+        QProcess cli;
+        QProcessEnvironment env = QProcessEnvironment::systemEnvironment();
+        env.insert("HOME", dir.path());
+        cli.setProcessEnvironment(env);
+        cli.start(qEnvironmentVariable("TAGORA_CLI"), {"--settings", settings(), "click", "cmdPrintItmes"});
+        QVERIFY(cli.waitForStarted());
+        auto tablesMade = [&] {
+            for (const QString& name : QDir(data).entryList({dbfiles::TempDocs + "*"}, QDir::Files)) {
+                if (name.endsWith("-journal"))
+                    continue;
+                Database made;
+                if (!made.open(data + "/" + name, Database::OpenMode::ReadOnly) && made.tableNames().size() >= 7)
+                    return true;
+            }
+            return false;
+        };
+        QTRY_VERIFY_WITH_TIMEOUT(tablesMade() || cli.state() == QProcess::NotRunning, 30000);
+        QCOMPARE(cli.state(), QProcess::Running);
+        cli.kill();
+        QVERIFY(cli.waitForFinished());
+        QVERIFY(!config.exec("ROLLBACK"));
+        config.close();
+        QVERIFY(!QFile::exists(data + "/" + dbfiles::TempDocs));
+        const QStringList left = QDir(data).entryList({dbfiles::TempDocs + ".building-*"}, QDir::Files);
+        QCOMPARE(left.filter(QRegularExpression("-[0-9]+$")).size(), 1);
+
+        const Run r = runCli(settings(), {"click", "cmdPrintItmes"});
+        QVERIFY2(r.exitCode == 0, qPrintable((r.out + r.err).join('\n')));
+        QCOMPARE(r.out.last(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        QVERIFY(QDir(data).entryList({"*.building-*"}, QDir::Files).isEmpty());
+        QVERIFY(MissingObjects(data + "/" + dbfiles::TempDocs).isEmpty());
+        QFile f(journal);
+        QVERIFY(f.open(QIODevice::ReadOnly));
+        QVERIFY(f.readAll().contains("LabelSetVar(2, \"ItemKey\", \"K1\""));
     }
 
     // A method with an optional last parameter stops taking arguments at the next verb.

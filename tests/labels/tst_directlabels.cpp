@@ -16,6 +16,8 @@
 #include <QStringDecoder>
 #include <QtTest>
 
+#include <sys/stat.h>
+
 using namespace tagora;
 
 namespace {
@@ -70,6 +72,20 @@ class TestDirectLabels : public QObject {
     Q_OBJECT
     QTemporaryDir work;
     int pages = 0;
+    const QByteArray runtimeDir = qgetenv("XDG_RUNTIME_DIR");
+    const QByteArray cacheHome = qgetenv("XDG_CACHE_HOME");
+
+    static void writeFile(const QString& path, const QByteArray& bytes)
+    {
+        QFile f(path);
+        QVERIFY(f.open(QIODevice::WriteOnly));
+        f.write(bytes);
+    }
+    static QByteArray readFile(const QString& path)
+    {
+        QFile f(path);
+        return f.open(QIODevice::ReadOnly) ? f.readAll() : QByteArray("(missing)");
+    }
 
     // A page for the items of `range`, with their copies, in key order.
     QString page(const LabelData& data, const DirectLabelLayout& layout, const QString& range,
@@ -99,6 +115,8 @@ private slots:
     {
         directLabelLayout() = DirectLabelLayout{};
         qunsetenv("Temp");
+        qputenv("XDG_RUNTIME_DIR", runtimeDir);
+        qputenv("XDG_CACHE_HOME", cacheHome);
     }
 
     // 2, 1 and 4 copies on a 2 x 2 page: seven labels on two pages, the last cell empty.
@@ -436,6 +454,98 @@ private slots:
         QCOMPARE(QDir(out.path()).entryList(QDir::Files | QDir::Hidden), QStringList{"tgrlab1.htm"});
         QVERIFY(earlier.open(QIODevice::ReadOnly));
         QCOMPARE(earlier.readAll(), QByteArray("earlier page"));
+    }
+
+    // A job folder planted by someone else is refused as it stands: a link to
+    // another folder, a folder others may write to. The print stops with the
+    // reason, and what the link points at is left whole.
+    void plantedJobFolderRefused_data()
+    {
+        QTest::addColumn<QString>("planted");
+        QTest::addColumn<QString>("reason");
+        QTest::newRow("link to a folder") << "link" << "קישור";
+        QTest::newRow("others may write") << "open" << "פתוחה לכתיבה";
+        QTest::newRow("a file") << "file" << "אינו תיקייה";
+    }
+    void plantedJobFolderRefused()
+    {
+        QFETCH(QString, planted);
+        QFETCH(QString, reason);
+        LabelData data;
+        QTemporaryDir temp;
+        const QString folder = temp.filePath("tgrlab");
+        const QString other = temp.filePath("other");
+        QVERIFY(QDir().mkpath(other));
+        writeFile(other + "/tgrlab1.htm", "someone's page");
+        writeFile(other + "/B0400001.BMP", "someone's picture");
+        if (planted == "link")
+            QVERIFY(QFile::link(other, folder));
+        else if (planted == "open")
+            QVERIFY(QDir().mkpath(folder) && QFile::setPermissions(folder, QFile::Permissions(0x7777)));
+        else
+            writeFile(folder, "a file");
+        const auto f = directCard(data, temp.path(), "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=2\n");
+        f->c<QPushButton>("cmdPrintItmes")->click();
+        QCOMPARE(f->prompt->criticalCount(), 1);
+        QVERIFY2(f->prompt->lines().join('\n').contains(reason), qPrintable(f->prompt->lines().join('\n')));
+        QVERIFY(f->pages->shown.isEmpty());
+        QCOMPARE(QDir(other).entryList(QDir::Files), QStringList({"B0400001.BMP", "tgrlab1.htm"}));
+        QCOMPARE(readFile(other + "/tgrlab1.htm"), QByteArray("someone's page"));
+        QCOMPARE(readFile(other + "/B0400001.BMP"), QByteArray("someone's picture"));
+    }
+
+    // A job removes only what jobs make (the page, the pictures by their
+    // names): other files stay, a folder is not entered, and a link under a
+    // picture's name goes as a link while the file it names stays.
+    void foreignFilesSurviveJob()
+    {
+        LabelData data;
+        QTemporaryDir temp;
+        const QString folder = temp.filePath("tgrlab");
+        QVERIFY(QDir().mkpath(folder + "/keep"));
+        writeFile(folder + "/notes.txt", "notes");
+        writeFile(folder + "/B04.BMP", "not a picture name");
+        writeFile(folder + "/keep/tgrlab1.htm", "kept page");
+        writeFile(folder + "/keep/B0400001.BMP", "kept picture");
+        writeFile(folder + "/B0400009.BMP", "old picture");
+        writeFile(temp.filePath("outside.txt"), "outside");
+        QVERIFY(QFile::link(temp.filePath("outside.txt"), folder + "/B0400008.BMP"));
+        const auto f = directCard(data, temp.path(), "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=2\n");
+        f->c<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f->prompt->lines().isEmpty(), qPrintable(f->prompt->lines().join('\n')));
+        QCOMPARE(f->pages->shown, QStringList{folder + "/tgrlab1.htm"});
+        QCOMPARE(QDir(folder).entryList(QDir::Files | QDir::System, QDir::Name),
+                 QStringList({"B04.BMP", "B0400002.BMP", "B0400003.BMP", "notes.txt", "tgrlab1.htm"}));
+        QCOMPARE(readFile(folder + "/notes.txt"), QByteArray("notes"));
+        QCOMPARE(readFile(folder + "/keep/tgrlab1.htm"), QByteArray("kept page"));
+        QCOMPARE(readFile(folder + "/keep/B0400001.BMP"), QByteArray("kept picture"));
+        QCOMPARE(readFile(temp.filePath("outside.txt")), QByteArray("outside"));
+    }
+
+    // Without "Temp" the job goes to a folder of the user's own, made private.
+    void privateJobFolder_data()
+    {
+        QTest::addColumn<bool>("runtime");
+        QTest::newRow("runtime folder") << true;
+        QTest::newRow("cache folder") << false;
+    }
+    void privateJobFolder()
+    {
+        QFETCH(bool, runtime);
+        LabelData data;
+        QTemporaryDir home;
+        qputenv("XDG_RUNTIME_DIR", runtime ? home.path().toUtf8() : QByteArray());
+        qputenv("XDG_CACHE_HOME", home.filePath("cache").toUtf8());
+        const QString folder = runtime ? home.filePath("tgrlab") : home.filePath("cache/tagora/tgrlab");
+        QCOMPARE(directJobFolder(), folder);
+        CardFixture f("[GeneralParams]\nDBPath=" + data.folder.toUtf8() + "\nOptOLE3=True\nOptOLE0=False\n"
+                      "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=2\n");
+        f.c<QPushButton>("cmdPrintItmes")->click();
+        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
+        QCOMPARE(f.pages->shown, QStringList{folder + "/tgrlab1.htm"});
+        struct stat st {};
+        QVERIFY(::lstat(QFile::encodeName(folder).constData(), &st) == 0);
+        QCOMPARE(st.st_mode & 07777, mode_t(0700));
     }
 
     // A host calling the method reads the outcome; the user sees the failure.

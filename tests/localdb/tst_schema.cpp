@@ -6,6 +6,7 @@
 
 #include <QDir>
 #include <QFile>
+#include <QProcess>
 #include <QTemporaryDir>
 #include <QtTest>
 
@@ -305,6 +306,8 @@ private slots:
         QVERIFY(db.prepare("SELECT * FROM qSelectDocLines").isValid());
     }
 
+    // A creation that fails half way leaves nothing of itself: the file
+    // already at the name stays as it was, and nothing is left aside.
     void missingLinkSourceStopsAtThatLink()
     {
         const QString config = path("partial-config.tdb");
@@ -315,15 +318,109 @@ private slots:
             QVERIFY(!c.exec("CREATE TABLE tDocTypes (DocType); CREATE TABLE tCSTable (a); CREATE TABLE tWizFiles (a);"
                             "CREATE TABLE tWizFileRanges (a)"));
         }
-        const QString target = path("partial.tmp");
+        QTemporaryDir other;
+        const QString target = other.filePath(dbfiles::TempDocs);
         DbError e;
+        QVERIFY(!CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), target, &e).isEmpty());
+        {
+            Database db;
+            QVERIFY(!db.open(target));
+            QVERIFY(!db.exec("INSERT INTO tAgents (AgentID, AgentName) VALUES (1, 'earlier')"));
+        }
         QVERIFY(CreateTempDocsDB(config, path(dbfiles::Items), target, &e).isEmpty());
         QCOMPARE(e.kind, DbError::Kind::NotFound);
         QVERIFY(e.message.contains("tCurrencies"));
+        QCOMPARE(QDir(other.path()).entryList(QDir::Files | QDir::Hidden), QStringList{dbfiles::TempDocs});
+        QCOMPARE(rows(target, "SELECT AgentName FROM tAgents"), QStringList{"earlier"});
+        QVERIFY(MissingObjects(target).isEmpty());
+    }
+
+    // An items database an earlier version left half made (a run killed
+    // while creating it) is completed where it lies, with its rows.
+    void incompleteItemsDatabaseCompleted_data()
+    {
+        QTest::addColumn<QString>("made");
+        QTest::newRow("items table only") << "CREATE TABLE tItems (ItemKey TEXT(25) COLLATE NOCASE NOT NULL, ItemName TEXT(100),"
+                                             " Copies SMALLINT, PrintLabel BOOLEAN, CONSTRAINT PrimaryKey PRIMARY KEY (ItemKey))";
+        QTest::newRow("empty file") << "";
+    }
+    void incompleteItemsDatabaseCompleted()
+    {
+        QFETCH(QString, made);
+        QTemporaryDir data;
+        const QString items = data.filePath(dbfiles::Items);
+        {
+            Database db;
+            QVERIFY(!db.open(items, Database::OpenMode::Create));
+            if (!made.isEmpty())
+                QVERIFY(!db.exec(made + ";INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('K1', 'Kept', 2, TRUE)"));
+        }
+        QVERIFY(!MissingObjects(items).isEmpty());
+        const DbError e = PrepareDataFolder(data.path());
+        QVERIFY2(!e, qPrintable(e.message));
+        QVERIFY(MissingObjects(items).isEmpty());
         Database db;
-        QVERIFY(!db.open(target));
-        QCOMPARE(linkNames(db), QStringList({"tDocTypes", "tCSTable"}));
-        QCOMPARE(db.tableNames().size(), 7);
+        QVERIFY(!db.open(items));
+        QCOMPARE(db.tableNames(), QStringList({"tItems", "tAlterKeys", "tAlterPrices", "tAccountDef", "tPriceList"}));
+        QCOMPARE(db.queryNames(), QStringList({"qSelectItems", "qSelectMarkedItems", "qEditItems"}));
+        QCOMPARE(rows(items, "SELECT ItemKey, Copies FROM qSelectMarkedItems"), made.isEmpty() ? QStringList() : QStringList{"K1|2"});
+        QVERIFY(db.prepare("SELECT FldID, FldMaxLen, Label2Name FROM tAccountDef").isValid());
+    }
+
+    // A documents database whose creation stopped before its links is built
+    // again, linked to the folder's files; one with its links keeps its rows.
+    void incompleteDocumentsDatabaseCompleted_data()
+    {
+        QTest::addColumn<bool>("linked");
+        QTest::newRow("no links") << false;
+        QTest::newRow("queries missing") << true;
+    }
+    void incompleteDocumentsDatabaseCompleted()
+    {
+        QFETCH(bool, linked);
+        const QString docs = path(dbfiles::TempDocs);
+        DbError e;
+        QVERIFY(!CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), docs, &e).isEmpty());
+        {
+            Database db;
+            QVERIFY(!db.open(docs));
+            QVERIFY(!db.exec("INSERT INTO tAgents (AgentID, AgentName) VALUES (1, 'A')"));
+            QVERIFY(!db.exec(linked ? "DELETE FROM tgrObjects WHERE Kind <> 'link'" : "DELETE FROM tgrObjects"));
+        }
+        QStringList repaired;
+        QVERIFY(!(e = RepairDataFolder(folder, &repaired)));
+        QCOMPARE(repaired, QStringList{dbfiles::TempDocs});
+        QVERIFY(MissingObjects(docs).isEmpty());
+        QCOMPARE(rows(docs, "SELECT AgentName FROM tAgents"), linked ? QStringList{"A"} : QStringList());
+        QVERIFY(!rows(docs, "SELECT HeadTable FROM qDocTypes").isEmpty());
+    }
+
+    // Files a killed build left are removed on the next run; a build of a
+    // running process, one of another machine and every other file stay.
+    void leftoverBuildsRemoved()
+    {
+        QTemporaryDir data;
+        QProcess gone;
+        gone.start("true");
+        QVERIFY(gone.waitForStarted());
+        const qint64 deadPid = gone.processId();
+        QVERIFY(gone.waitForFinished());
+        const QString mine = BuildingPath(data.filePath(dbfiles::TempDocs));
+        QString dead = BuildingPath(data.filePath(dbfiles::Items));
+        dead.chop(QString::number(QCoreApplication::applicationPid()).size());
+        dead += QString::number(deadPid);
+        const QString deadName = QFileInfo(dead).fileName();
+        const QString mineName = QFileInfo(mine).fileName();
+        const QStringList planted{deadName, deadName + "-journal", mineName, "tgrmitm.tdb.building-elsewhere-1",
+                                  "notes.building-x-1", "tagora.tdb.new", "tgrmitm.tdb.bak"};
+        for (const QString& name : planted) {
+            QFile f(data.filePath(name));
+            QVERIFY(f.open(QIODevice::WriteOnly));
+        }
+        QVERIFY(!RepairDataFolder(data.path()));
+        QStringList expected{mineName, "tgrmitm.tdb.building-elsewhere-1", "notes.building-x-1", "tgrmitm.tdb.bak"};
+        expected.sort();
+        QCOMPARE(QDir(data.path()).entryList(QDir::Files | QDir::Hidden, QDir::Name), expected);
     }
 
     void upgrade()
