@@ -61,7 +61,7 @@ bool MainCard::prepareDirectFields(QString* error)
 bool MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
 {
     QString error;
-    if (prepareDirectFields(&error))
+    if (prepareDirectFields(&error) && (error = labelQueryProblem()).isEmpty())
         error = CreateLabPage(pFileName, pDBName, BuildItemQuery(pQueryType, pOrderBy).toString(), directLabelLayout(),
                               ui->txtPriceFormat->text(), this);
     if (error.isEmpty())
@@ -74,7 +74,7 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
 {
     auto fail = [this](const QString& error) { m_services.prompt->critical(titles::Fault, error); };
     QString error;
-    if (!prepareDirectFields(&error))
+    if (!prepareDirectFields(&error) || !(error = labelQueryProblem()).isEmpty())
         return fail(error);
     const DirectLabelLayout& layout = directLabelLayout();
     const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
