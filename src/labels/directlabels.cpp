@@ -52,8 +52,9 @@ public:
         QByteArray bytes = m_encoder.encode(text);
         if (m_encoder.hasError()) {
             bytes.clear();
+            // One reference per character: a surrogate pair is one code point.
             for (int i = 0; i < text.size(); ++i) {
-                const bool pair = text[i].isHighSurrogate() && i + 1 < text.size();
+                const bool pair = text[i].isHighSurrogate() && i + 1 < text.size() && text[i + 1].isLowSurrogate();
                 const QString one = pair ? text.mid(i, 2) : text.mid(i, 1);
                 QStringEncoder single("windows-1255");
                 QByteArray b = single.encode(one);
@@ -149,8 +150,9 @@ QString lineText(const LabelLineDef& line, int index, const Statement& record, i
     }
     if (!line.Prefix.isEmpty())
         text = line.Prefix + QLatin1Char(' ') + text;
-    if (maxTextLen > 0 && text.size() > maxTextLen)
-        text = text.left(maxTextLen);
+    // Counted in characters: half an emoji would break the page's markup.
+    if (maxTextLen > 0)
+        text = LeftChars(text, maxTextLen);
     if (logical)
         return nameTableOpen(QStringLiteral("L%1").arg(index)) + QStringLiteral("<td nowrap>") + escaped(text)
             + QStringLiteral("</td></tr></table>");
@@ -318,10 +320,13 @@ QString LetterTable(const QVariant& value, const QString& className)
     const QString text = value.isValid() && !value.isNull() ? value.toString() : QString();
     QString out = nameTableOpen(className);
     QString previous;
-    for (const QChar c : text) {
+    // A cell per character: a surrogate pair split over two cells is no character at all.
+    for (qsizetype i = 0, units = 1; i < text.size(); i += units) {
+        units = CharUnitsAt(text, i);
+        const QChar c = text[i];
         if (c == kCellSeparator)
             continue;
-        const QString cell = c == QLatin1Char(' ') ? QStringLiteral("&nbsp;") : escaped(QString(c));
+        const QString cell = c == QLatin1Char(' ') ? QStringLiteral("&nbsp;") : escaped(text.mid(i, units));
         if (!(cell == QLatin1String("&nbsp;") && previous == QLatin1String("&nbsp;")))
             out += QStringLiteral("<td>") + cell + QStringLiteral("</td>");
         previous = cell;

@@ -151,6 +151,11 @@ private slots:
         QTest::newRow("markup is text") << "" << 0 << "<b>&'x'" << false << "" << "&lt;b&gt;&amp;&#39;x&#39;";
         // The page is in the Hebrew code page; what it lacks goes as a character reference.
         QTest::newRow("code page") << "" << 0 << "בורג ش €" << false << "" << "בורג &#1588; €";
+        // Beyond the basic plane: one reference per character, and a cut that
+        // counts characters keeps an emoji whole.
+        QTest::newRow("emoji and math letter") << "" << 0 << "😀 𝐀" << false << "" << "&#128512; &#119808;";
+        QTest::newRow("cut after an emoji") << "" << 2 << "😀😀😀" << false << "" << "&#128512;&#128512;";
+        QTest::newRow("cut counts the prefix's emoji") << "😀" << 3 << "𝐀bc" << false << "" << "&#128512; &#119808;";
     }
     void cellText()
     {
@@ -245,6 +250,7 @@ private slots:
         QTest::newRow("run of blanks is one cell") << QVariant("a  b") << "L2" << "<td>a</td><td>&nbsp;</td><td>b</td>";
         QTest::newRow("separators dropped") << QVariant(sep + "x" + sep + "<" + sep) << "" << "<td>x</td><td>&lt;</td>";
         QTest::newRow("null") << QVariant() << "L1" << "";
+        QTest::newRow("emoji is one cell") << QVariant("a😀" + sep + "𝐀") << "" << "<td>a</td><td>😀</td><td>𝐀</td>";
     }
     void letterTable()
     {
@@ -270,6 +276,8 @@ private slots:
         QTest::newRow("type 2, Latin") << 2 << "Makita DHP482 (18V)" << "text:Makita DHP482 (18V)";
         QTest::newRow("type 2, Hebrew") << 2 << "מקדחה" << "text:מקדחה";
         QTest::newRow("type 2, mixed") << 2 << "מקדחה (Makita 18V) <2>" << "text:מקדחה (Makita 18V) <2>";
+        QTest::newRow("type 1, emoji") << 1 << "😀 𝐀 החדקמ" << "cells:&#128512; &#119808; החדקמ";
+        QTest::newRow("type 2, emoji") << 2 << "מקדחה 😀𝐀" << "text:מקדחה &#128512;&#119808;";
     }
     void nameLineReads()
     {
