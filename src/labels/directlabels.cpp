@@ -66,13 +66,22 @@ public:
             }
             m_encoder.resetState();
         }
-        if (m_file.write(bytes) != bytes.size())
+        // The buffer hides a failed write from write()'s count; the device's
+        // error shows it once the buffer was flushed.
+        if (!m_failed && (m_file.write(bytes) != bytes.size() || m_file.error() != QFileDevice::NoError))
             m_failed = true;
     }
+
+    // A write that failed (a full disk) fails the page: the rest need not be made.
+    bool failed() const { return m_failed; }
 
     // Puts the page in place; false, with the page left out, when any write failed.
     bool commit()
     {
+        // QSaveFile (Qt 6.4) commits a page whose last buffer the disk refused
+        // (a file size limit, a full disk): the flush is asked first.
+        if (!m_failed && !m_file.flush())
+            m_failed = true;
         if (m_failed) {
             m_file.cancelWriting();
             m_file.commit();
@@ -228,13 +237,22 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
         if (!bar.LeftPrefix.isEmpty())
             data = bar.LeftPrefix + data;
         QString reason;
-        if (!DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
-                         &reason)
-            && refusals)
+        bool unwritten = false;
+        if (DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
+                        &reason, &unwritten))
+            continue;
+        // A picture the disk would not take is no reason to print labels
+        // without it: every record after it would fail the same way.
+        if (unwritten) {
+            failure = QStringLiteral("לא ניתן לכתוב את תמונות הברקוד בתיקייה '%1', ולכן לא הודפסו מדבקות.\n%2")
+                          .arg(QDir::toNativeSeparators(folder), reason);
+            break;
+        }
+        if (refusals)
             refusals->push_back({record, copiesOf(copiesColumn >= 0 ? records.value(copiesColumn) : QVariant()), data,
                                  reason});
     }
-    if (step == Statement::Step::Error)
+    if (failure.isEmpty() && step == Statement::Step::Error)
         failure = records.error().message;
     library.A1CloseInstance(handle);
     return failure;
@@ -348,7 +366,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     const QString picture = pictureAttributes(layout.bar);
     const QString format = priceFormat.trimmed().isEmpty() ? QStringLiteral("0.00") : priceFormat.trimmed();
 
-    const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+    const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה (ייתכן שהדיסק מלא), ולכן לא הודפסו מדבקות")
+                                    .arg(QDir::toNativeSeparators(fileName));
     PageWriter out(fileName);
     if (!out.open())
         return QStringLiteral("לא ניתן ליצור את הקובץ '%1'").arg(QDir::toNativeSeparators(fileName));
@@ -431,7 +450,7 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     };
     next();
     int counter = 0;
-    for (long long p = 1; p <= pages && !e; ++p) {
+    for (long long p = 1; p <= pages && !e && !out.failed(); ++p) {
         out.line(QStringLiteral("<table height='100%' width='100%' border='0'>"));
         for (int r = 1; r <= page.PageRows; ++r) {
             out.line(QStringLiteral("  <tr>"));

@@ -1,5 +1,6 @@
 // The direct-label page, its pictures and the job as the print button runs it.
 #include "support/cardfixture.h"
+#include "support/filelimit.h"
 #include "support/labeldata.h"
 
 #include "erp/textconv.h"
@@ -414,6 +415,34 @@ private slots:
         QVERIFY2(shown.startsWith(QString::fromUtf8("שימו לב: 4 מתוך 9 המדבקות שבדף")), qPrintable(shown));
         QVERIFY2(shown.contains("729000000001X") && shown.contains("EAN-13"), qPrintable(shown));
         QVERIFY2(!shown.contains(QRegularExpression("Error|Invalid|digits")), qPrintable(shown));
+    }
+
+    // A disk that fills up during the job: the pictures or the page cannot be
+    // written whole, so nothing is shown as printed; the user reads why.
+    void fullDiskStopsTheJob_data()
+    {
+        QTest::addColumn<bool>("pictures");
+        QTest::newRow("barcode pictures") << true;
+        QTest::newRow("the page") << false;
+    }
+    void fullDiskStopsTheJob()
+    {
+        QFETCH(bool, pictures);
+        LabelData data;
+        const QString ini = pictures ? "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=2\n"
+                                     : "[LabelDef0]\nUseCell=-1\nFldID=0\n";
+        const auto f = directCard(data, work.filePath(QStringLiteral("full%1").arg(pictures)), ini);
+        // Smaller than a picture or a page, larger than nothing.
+        const LimitedRun run = runWithFileLimit(1000, [&] {
+            f->c<QPushButton>("cmdPrintItmes")->click();
+            return (QStringList{QString::number(f->pages->shown.size())} + f->prompt->lines()).join(QChar(0x1e)).toUtf8();
+        });
+        QVERIFY(run.exited);
+        const QStringList report = QString::fromUtf8(run.report).split(QChar(0x1e));
+        QCOMPARE(report.first(), QStringLiteral("0")); // no page shown
+        QCOMPARE(report.size(), 2);                     // one message: no "attention" for missing barcodes
+        QVERIFY2(report[1].startsWith(QString::fromUtf8("תקלה: ")), qPrintable(report[1]));
+        QVERIFY2(report[1].contains(QString::fromUtf8("לא הודפסו מדבקות")), qPrintable(report[1]));
     }
 
     // A page that fails after its head leaves nothing of itself behind; an
