@@ -77,6 +77,9 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
     if (!prepareDirectFields(&error) || !(error = labelQueryProblem()).isEmpty())
         return fail(error);
     const DirectLabelLayout& layout = directLabelLayout();
+    // Before the job folder is emptied: a layout no sheet can hold leaves the last job's page as it was.
+    if (!(error = CheckDirectLayout(layout)).isEmpty())
+        return fail(error);
     const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
     const QString sql = BuildItemQuery(queryType, order).toString();
     const QString folder = directJobFolder();

@@ -359,8 +359,8 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     if (labels)
         *labels = 0;
     const LabelPageDef& page = layout.page;
-    if (page.PageRows <= 0 || page.PageCols <= 0)
-        return QStringLiteral("מבנה דף המדבקות אינו תקין: %1 שורות, %2 מדבקות בשורה").arg(page.PageRows).arg(page.PageCols);
+    if (const QString why = CheckDirectLayout(layout); !why.isEmpty())
+        return why;
     const QString height = QStringLiteral("height='") + cellPercent(page.PageRows) + QStringLiteral("%'");
     const QString width = QStringLiteral("width='") + cellPercent(page.PageCols) + QStringLiteral("%'");
     const QString picture = pictureAttributes(layout.bar);

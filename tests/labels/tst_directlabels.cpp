@@ -17,6 +17,8 @@
 #include <QStringDecoder>
 #include <QtTest>
 
+#include <map>
+
 using namespace tagora;
 
 namespace {
@@ -443,6 +445,71 @@ private slots:
         QCOMPARE(report.size(), 2);                     // one message: no "attention" for missing barcodes
         QVERIFY2(report[1].startsWith(QString::fromUtf8("תקלה: ")), qPrintable(report[1]));
         QVERIFY2(report[1].contains(QString::fromUtf8("לא הודפסו מדבקות")), qPrintable(report[1]));
+    }
+
+    // A layout no sheet can hold is refused, naming the setting, before any
+    // picture or page is made; up to the bounds it prints.
+    void layoutBounds_data()
+    {
+        QTest::addColumn<QString>("key");
+        QTest::addColumn<double>("value");
+        QTest::addColumn<bool>("refused");
+        QTest::newRow("32767 rows") << "PageRows" << 32767.0 << true;
+        QTest::newRow("no columns") << "PageCols" << 0.0 << true;
+        QTest::newRow("100 columns") << "PageCols" << 100.0 << false;
+        QTest::newRow("huge margin") << "LabTop" << 32767.0 << true;
+        QTest::newRow("font of 255 points") << "FontSize" << 255.0 << true;
+        QTest::newRow("line of 32767 points") << "Height" << 32767.0 << true;
+        QTest::newRow("narrow bar of an inch") << "DimX" << 1.0 << true;
+        QTest::newRow("bars 3000 inches high") << "BarHeight" << 3000.0 << true;
+        QTest::newRow("picture 32767 wide") << "UserResoX" << 32767.0 << true;
+        QTest::newRow("picture shown at natural size") << "UserResoY" << -1.0 << false;
+    }
+    void layoutBounds()
+    {
+        QFETCH(QString, key);
+        QFETCH(double, value);
+        QFETCH(bool, refused);
+        LabelData data;
+        DirectLabelLayout& layout = directLabelLayout();
+        const std::map<QString, std::function<void(double)>> set{
+            {"PageRows", [&](double v) { layout.page.PageRows = short(v); }},
+            {"PageCols", [&](double v) { layout.page.PageCols = short(v); }},
+            {"LabTop", [&](double v) { layout.page.LabTop = short(v); }},
+            {"FontSize", [&](double v) { layout.lines[0].FontSize = uchar(v); }},
+            {"Height", [&](double v) { layout.lines[0].Height = short(v); }},
+            {"DimX", [&](double v) { layout.bar.DimX = float(v); }},
+            {"BarHeight", [&](double v) { layout.bar.BarHeight = float(v); }},
+            {"UserResoX", [&](double v) { layout.bar.UserResoX = short(v); }},
+            {"UserResoY", [&](double v) { layout.bar.UserResoY = short(v); }},
+        };
+        const QString temp = work.filePath("bounds-" + key);
+        const QString earlier = temp + "/tgrlab/tgrlab1.htm";
+        QVERIFY(QDir().mkpath(temp + "/tgrlab"));
+        QFile old(earlier);
+        QVERIFY(old.open(QIODevice::WriteOnly));
+        old.write("earlier page");
+        old.close();
+
+        const auto f = directCard(data, temp, "[LabelBar]\nBarType=2\n");
+        layout.lines[0] = textLine(0, "ItemKey");
+        layout.lines[1] = textLine(4, "BarCode");
+        layout.lines[1].ViewType = 1;
+        set.at(key)(value);
+        f->c<QPushButton>("cmdPrintItmes")->click();
+
+        QCOMPARE(f->pages->shown.size(), refused ? 0 : 1);
+        QCOMPARE(f->prompt->criticalCount(), refused ? 1 : 0);
+        if (refused) {
+            QVERIFY2(f->prompt->lines().first().contains("(" + key + ")"), qPrintable(f->prompt->lines().first()));
+            // Nothing of the job was started: the last job's page is as it was, no picture made.
+            QVERIFY(old.open(QIODevice::ReadOnly));
+            QCOMPARE(old.readAll(), QByteArray("earlier page"));
+            QCOMPARE(QDir(temp + "/tgrlab").entryList(QDir::Files), QStringList{"tgrlab1.htm"});
+            // A host's page is refused the same way.
+            QVERIFY(CreateLabPage(work.filePath("bounds.htm"), data.docs, "SELECT 1 AS Copies", layout, "0.00", nullptr)
+                        .contains("(" + key + ")"));
+        }
     }
 
     // A page that fails after its head leaves nothing of itself behind; an
