@@ -288,7 +288,7 @@ DbError Database::lastError(int rc) const
         e.kind = DbError::Kind::DuplicateKey;
     // Another program (or window) holds the file for the whole wait: the user
     // can do nothing about the engine's words, only try again later.
-    if ((e.code & 0xff) == SQLITE_BUSY || (e.code & 0xff) == SQLITE_LOCKED)
+    if ((e.code & 0xff) == SQLITE_BUSY)
         e.message = QStringLiteral("הקובץ '%1' תפוס כעת בידי תוכנה אחרת או חלון אחר, ולכן הפעולה לא בוצעה. נסו שוב בעוד רגע.")
                         .arg(QDir::toNativeSeparators(m_path));
     else if ((e.code & 0xff) == SQLITE_CANTOPEN)
