@@ -183,6 +183,8 @@ private:
     void SetBrowserPrinter(const QString& printer);
     void PrintDirectLabels(uchar queryType, const QString& dbPath);
     bool prepareDirectFields(QString* error);
+    // Why the label-data query of the screen's settings cannot run, or empty text.
+    QString labelQueryProblem() const;
     void ShowItemList(uchar queryType, const QString& dbPath);
     void ImportItems();
     void ImportDocuments();

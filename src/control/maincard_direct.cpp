@@ -96,7 +96,7 @@ bool MainCard::prepareDirectFields(QString* error)
 bool MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, uchar pQueryType, uchar pOrderBy)
 {
     QString error;
-    if (prepareDirectFields(&error))
+    if (prepareDirectFields(&error) && (error = labelQueryProblem()).isEmpty())
         error = CreateLabPage(pFileName, pDBName, BuildItemQuery(pQueryType, pOrderBy).toString(), directLabelLayout(),
                               ui->txtPriceFormat->text(), this);
     if (error.isEmpty())
@@ -109,9 +109,12 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
 {
     auto fail = [this](const QString& error) { m_services.prompt->critical(titles::Fault, error); };
     QString error;
-    if (!prepareDirectFields(&error))
+    if (!prepareDirectFields(&error) || !(error = labelQueryProblem()).isEmpty())
         return fail(error);
     const DirectLabelLayout& layout = directLabelLayout();
+    // Before the job folder is emptied: a layout no sheet can hold leaves the last job's page as it was.
+    if (!(error = CheckDirectLayout(layout)).isEmpty())
+        return fail(error);
     const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
     const QString sql = BuildItemQuery(queryType, order).toString();
     const QString folder = directJobFolder();

@@ -46,9 +46,23 @@ QVariant MainCard::BuildItemQuery(uchar pQueryType, uchar pOrderBy)
     return QVariant(tagora::BuildItemQuery(s, pQueryType, pOrderBy));
 }
 
+QString MainCard::labelQueryProblem() const
+{
+    LabelQuerySettings s;
+    readFieldRows(*this, s);
+    return CheckItemQuery(s);
+}
+
 short MainCard::RunOLE(const QString& DefaultLabelName, short /*Copies*/, uchar pQueryType, short pServerType,
                        const QString& pDBName, bool pPrintHeadLab, bool ByPlate)
 {
+    // A label list's record fills the expression rows itself.
+    if (!ByPlate) {
+        if (const QString problem = labelQueryProblem(); !problem.isEmpty()) {
+            m_services.prompt->critical(titles::Fault, problem);
+            return 0;
+        }
+    }
     LabelRunRequest r;
     r.defaultLabel = DefaultLabelName;
     r.programCode = pServerType;

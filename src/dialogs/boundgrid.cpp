@@ -10,6 +10,13 @@
 
 namespace tagora {
 
+namespace {
+// A grid answers a click: when another program holds the file, a short wait
+// rides out its commit, and a long one would only freeze the screen before
+// the same message.
+constexpr int kGridBusyWaitMs = 2000;
+} // namespace
+
 BoundTableModel::BoundTableModel(QObject* parent)
     : QAbstractTableModel(parent)
 {
@@ -37,6 +44,7 @@ bool BoundTableModel::setQuery(const QString& sql)
 bool BoundTableModel::refresh()
 {
     Database db;
+    db.setBusyWait(kGridBusyWaitMs);
     DbError e = db.open(m_dbPath);
     Statement s;
     if (!e)
@@ -212,6 +220,7 @@ bool BoundTableModel::setField(const QVector<int>& rows, const QString& field, c
     for (int k = 0; k < m_keys.size(); ++k)
         where << QStringLiteral("\"%1\" = ?%2").arg(m_keys[k]).arg(k + 2);
     Database db;
+    db.setBusyWait(kGridBusyWaitMs);
     DbError e = db.open(m_dbPath);
     if (!e) {
         Transaction tx(db);

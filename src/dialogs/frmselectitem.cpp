@@ -194,8 +194,10 @@ void FrmSelectItem::markListed(bool on)
     for (int row = 0; row < m_model->rowCount(); ++row)
         if ((m_model->value(row, QStringLiteral("PrintLabel")).toLongLong() != 0) != on)
             rows << row;
-    if (!rows.isEmpty())
-        m_model->setField(rows, QStringLiteral("PrintLabel"), on ? 1 : 0);
+    // A write that failed was said by the grid, which still shows what the
+    // file holds; reading the file again would only wait on it once more.
+    if (!rows.isEmpty() && !m_model->setField(rows, QStringLiteral("PrintLabel"), on ? 1 : 0))
+        return;
     refresh(m_model->query());
 }
 

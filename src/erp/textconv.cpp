@@ -97,11 +97,16 @@ QString VisualToLogical(const QString& text, short connType)
     QString result;
     QString run;
     result.reserve(text.size());
-    for (const QChar c : text) {
-        const QChar m = mirrorBracket(c);
-        if (isRunChar(c)) {
+    for (qsizetype i = 0; i < text.size();) {
+        const qsizetype units = CharUnitsAt(text, i);
+        const QChar c = text[i];
+        const QStringView one = QStringView(text).mid(i, units);
+        i += units;
+        const QChar mirrored = mirrorBracket(c);
+        const QStringView m = units == 1 ? QStringView(&mirrored, 1) : one;
+        if (units == 1 && isRunChar(c)) {
             run += m;
-        } else if (isJoiner(c)) {
+        } else if (units == 1 && isJoiner(c)) {
             if (!run.isEmpty())
                 run += m;
             else
@@ -128,19 +133,54 @@ QString ReverseForCells(const QString& text, short connType)
 {
     QString out;
     out.reserve(text.size() * 2 + 1);
-    for (int i = text.size() - 1; i >= 0; --i) {
+    auto add = [&out](QStringView one) {
         out += kCellSeparator;
-        out += MirrorChar(text[i]);
+        if (one.size() == 1)
+            out += MirrorChar(one.front());
+        else
+            out += one;
+    };
+    // Type 2 keeps the characters in their own order, still mirrored.
+    if (connType == 2) {
+        for (qsizetype i = 0; i < text.size(); i += CharUnitsAt(text, i))
+            add(QStringView(text).mid(i, CharUnitsAt(text, i)));
+    } else {
+        for (qsizetype end = text.size(); end > 0;) {
+            const qsizetype units = end >= 2 && text[end - 1].isLowSurrogate() && text[end - 2].isHighSurrogate() ? 2 : 1;
+            end -= units;
+            add(QStringView(text).mid(end, units));
+        }
     }
     out += kCellSeparator;
-    if (connType == 2)
-        std::reverse(out.begin(), out.end());
     return out;
 }
 
 QString ReverseForCells(const QString& text)
 {
     return ReverseForCells(text, s_connType);
+}
+
+// An emoji or a mathematical letter is a surrogate pair that must move and
+// be cut as one.
+qsizetype CharUnitsAt(const QString& text, qsizetype i)
+{
+    return text[i].isHighSurrogate() && i + 1 < text.size() && text[i + 1].isLowSurrogate() ? 2 : 1;
+}
+
+QString LeftChars(const QString& text, int count)
+{
+    qsizetype end = 0;
+    for (int n = 0; n < count && end < text.size(); ++n)
+        end += CharUnitsAt(text, end);
+    return text.left(end);
+}
+
+int CharCount(const QString& text)
+{
+    int n = 0;
+    for (qsizetype i = 0; i < text.size(); i += CharUnitsAt(text, i))
+        ++n;
+    return n;
 }
 
 bool HasHebrewLetters(const QString& text)

@@ -25,11 +25,19 @@ QString VisualToLogical(const QString& text);
 
 // Cell form: every character (mirrored) between separators, last to first;
 // for type 2 the result is turned back so the characters keep their order.
+// A character is a code point: a surrogate pair stays whole and in order.
 QString ReverseForCells(const QString& text, short connType);
 QString ReverseForCells(const QString& text);
 // The character as the cell form writes it: brackets and angle brackets turned
 // around. Applying it twice gives the character back.
 QChar MirrorChar(QChar c);
+
+// Texts counted in characters (code points), not UTF-16 units, so a cut never
+// splits an emoji or another character beyond the basic plane.
+QString LeftChars(const QString& text, int count);
+// UTF-16 units of the character at i (an index within the text): 2 for a surrogate pair.
+qsizetype CharUnitsAt(const QString& text, qsizetype i);
+int CharCount(const QString& text);
 
 bool HasHebrewLetters(const QString& text);
 

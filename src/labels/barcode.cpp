@@ -1,9 +1,12 @@
 #include "labels/barcode.h"
 
+#include "erp/textconv.h"
+
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
 #include <QTemporaryDir>
+#include <QtEndian>
 
 #include <cmath>
 #include <zint.h>
@@ -69,11 +72,27 @@ QString symbologyName(int code, bool fullAscii)
     }
 }
 
-QString invalidCharacter(QChar c, const QString& allowed)
+// The characters of a value one by one: an emoji is one character, named
+// whole in a message, never half of it.
+template <class Visit> QString firstRefused(const QString& data, Visit refuses)
 {
-    const QString shown = c.unicode() < 0x20 || c.unicode() == 0x7F
-        ? QStringLiteral("תו הבקרה שקודו %1").arg(c.unicode())
-        : QStringLiteral("התו '%1'").arg(c);
+    for (qsizetype i = 0; i < data.size();) {
+        const qsizetype units = CharUnitsAt(data, i);
+        const char32_t u = units == 2 ? QChar::surrogateToUcs4(data[i], data[i + 1]) : data[i].unicode();
+        const QString one = data.mid(i, units);
+        i += units;
+        if (refuses(u, one))
+            return one;
+    }
+    return QString();
+}
+
+QString invalidCharacter(const QString& one, const QString& allowed)
+{
+    const char16_t u = one.size() == 1 ? one.front().unicode() : 0;
+    const QString shown = one.size() == 1 && (u < 0x20 || u == 0x7F)
+        ? QStringLiteral("תו הבקרה שקודו %1").arg(u)
+        : QStringLiteral("התו '%1'").arg(one);
     return QStringLiteral("%1 אינו חוקי: %2").arg(shown, allowed);
 }
 
@@ -81,25 +100,22 @@ QString invalidCharacter(QChar c, const QString& allowed)
 // what it does carry; empty when every character is one it carries.
 QString refusedCharacter(int symbology, const QString& data)
 {
-    for (const QChar c : data) {
-        const ushort u = c.unicode();
+    QString allowed;
+    const QString one = firstRefused(data, [&](char32_t u, const QString&) {
         switch (symbology) {
         case BARCODE_CODE39:
-            if (!((u >= '0' && u <= '9') || (u >= 'A' && u <= 'Z') || QStringLiteral(" -.$/+%").contains(c)))
-                return invalidCharacter(c, QStringLiteral("מותרים רק ספרות, אותיות גדולות באנגלית, רווח והסימנים - . $ / + %"));
-            break;
+            allowed = QStringLiteral("מותרים רק ספרות, אותיות גדולות באנגלית, רווח והסימנים - . $ / + %");
+            return !((u >= '0' && u <= '9') || (u >= 'A' && u <= 'Z') || (u < 0x80 && QStringLiteral(" -.$/+%").contains(QChar(u))));
         case BARCODE_EXCODE39:
-            if (u > 0x7F)
-                return invalidCharacter(c, QStringLiteral("מותרים רק אותיות באנגלית, ספרות, סימנים ותווי בקרה"));
-            break;
+            allowed = QStringLiteral("מותרים רק אותיות באנגלית, ספרות, סימנים ותווי בקרה");
+            return u > 0x7F;
         case BARCODE_CODE128:
-            if (u > 0xFF)
-                return invalidCharacter(c, QStringLiteral("מותרים רק אותיות לטיניות, ספרות וסימנים"));
-            break;
-        default: break;
+            allowed = QStringLiteral("מותרים רק אותיות לטיניות, ספרות וסימנים");
+            return u > 0xFF;
+        default: return false;
         }
-    }
-    return QString();
+    });
+    return one.isEmpty() ? QString() : invalidCharacter(one, allowed);
 }
 
 // The check digit an EAN of full length should end with.
@@ -157,27 +173,18 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
     };
     if (data.isEmpty())
         return refuse(QStringLiteral("אין ערך לקידוד"));
-    auto firstOutside = [&data](ushort first, ushort last) {
-        for (QChar c : data)
-            if (c.unicode() < first || c.unicode() > last)
-                return c;
-        return QChar();
+    auto firstOutside = [&data](char32_t first, char32_t last) {
+        return firstRefused(data, [&](char32_t u, const QString&) { return u < first || u > last; });
     };
-    auto firstNonDigit = [&data]() {
-        for (QChar c : data)
-            if (c < QLatin1Char('0') || c > QLatin1Char('9'))
-                return c;
-        return QChar();
-    };
+    auto firstNonDigit = [&firstOutside]() { return firstOutside('0', '9'); };
     switch (code) {
     case 0:
         if (fullAscii) {
             recipe->symbology = BARCODE_EXCODE39;
         } else {
-            for (QChar c : data) {
-                if (c.isLower())
-                    return refuse(invalidCharacter(c, QStringLiteral("ב-CODE-39 אין אותיות קטנות (יש ב-CODE-39 Ascii)")));
-            }
+            const QString lower = firstRefused(data, [](char32_t u, const QString&) { return QChar::isLower(u); });
+            if (!lower.isEmpty())
+                return refuse(invalidCharacter(lower, QStringLiteral("ב-CODE-39 אין אותיות קטנות (יש ב-CODE-39 Ascii)")));
             recipe->symbology = BARCODE_CODE39;
         }
         recipe->checkOption = checkDigit ? 1 : 0;
@@ -186,19 +193,19 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
         recipe->symbology = BARCODE_CODE128;
         return true;
     case 14:
-        if (const QChar c = firstOutside(0x00, 0x5F); !c.isNull())
+        if (const QString c = firstOutside(0x00, 0x5F); !c.isEmpty())
             return refuse(invalidCharacter(c, QStringLiteral("מותרים רק אותיות גדולות באנגלית, ספרות, סימנים ותווי בקרה")));
         recipe->symbology = BARCODE_CODE128B;
         return true;
     case 15:
-        if (const QChar c = firstOutside(0x20, 0x7F); !c.isNull())
+        if (const QString c = firstOutside(0x20, 0x7F); !c.isEmpty())
             return refuse(invalidCharacter(c, QStringLiteral("מותרים רק אותיות באנגלית, ספרות וסימנים")));
         recipe->symbology = BARCODE_CODE128B;
         return true;
     case 9:
     case 10: {
         const int full = code == 9 ? 8 : 13;
-        if (const QChar c = firstNonDigit(); !c.isNull())
+        if (const QString c = firstNonDigit(); !c.isEmpty())
             return refuse(invalidCharacter(c, QStringLiteral("מותרות ספרות בלבד")));
         recipe->quietZones = false;
         if (data.size() == full) {
@@ -217,7 +224,7 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
         return refuse(QStringLiteral("אורך שגוי: %1 ספרות, ונדרשות %2 ספרות כולל ספרת הביקורת").arg(data.size()).arg(full));
     }
     case 4: {
-        if (const QChar c = firstNonDigit(); !c.isNull())
+        if (const QString c = firstNonDigit(); !c.isEmpty())
             return refuse(invalidCharacter(c, QStringLiteral("מותרות ספרות בלבד")));
         const int digits = int(data.size()) + (checkDigit ? 1 : 0);
         if (digits % 2 != 0) {
@@ -235,6 +242,21 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
     }
 }
 
+// zint 2.11 writes the picture through stdio and looks at neither fwrite's
+// nor fclose's result: a disk that fills up mid-picture leaves a cut file (or
+// an empty one) and a success. The BMP header states the whole file's size,
+// so a file of any other size was cut short.
+bool wholeBitmap(const QString& path)
+{
+    QFile f(path);
+    if (!f.open(QIODevice::ReadOnly))
+        return false;
+    const QByteArray head = f.read(6);
+    if (head.size() < 6 || !head.startsWith("BM"))
+        return false;
+    return f.size() == qint64(qFromLittleEndian<quint32>(head.constData() + 2));
+}
+
 } // namespace
 
 struct ZintBarcodeLibrary::Instance {
@@ -250,6 +272,7 @@ struct ZintBarcodeLibrary::Instance {
     bool showDesc = false;
     int resoX = kDefaultResolution;
     int resoY = kDefaultResolution;
+    bool unwritten = false; // the last output failed for the file
 };
 
 ZintBarcodeLibrary::ZintBarcodeLibrary() = default;
@@ -358,8 +381,8 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
 {
     Instance* in = find(handle);
     QString shown = in ? in->data : QString();
-    if (shown.size() > 40)
-        shown = shown.left(40) + QStringLiteral("...");
+    if (CharCount(shown) > 40)
+        shown = LeftChars(shown, 40) + QStringLiteral("...");
     // The value, the barcode type and why: the user fixes the value or the type.
     const QString what = in ? QStringLiteral("ברקוד %1 לערך \"%2\": ").arg(symbologyName(in->code, in->c39Ascii), shown)
                             : QStringLiteral("ברקוד: ");
@@ -368,12 +391,20 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
             *error = what + why;
         return false;
     };
+    if (in)
+        in->unwritten = false;
+    auto failFile = [&](const QString& why) {
+        if (in)
+            in->unwritten = true;
+        return fail(why);
+    };
+    const QString shownPath = QDir::toNativeSeparators(path);
 
     // The page names this picture whether or not it is made, so a picture left
     // from an earlier job would be printed for this record.
     const QFileInfo target(path);
     if ((target.exists() || target.isSymLink()) && !QFile::remove(path))
-        return fail(QStringLiteral("לא ניתן למחוק את התמונה הקודמת '%1'").arg(QDir::toNativeSeparators(path)));
+        return failFile(QStringLiteral("לא ניתן למחוק את התמונה הקודמת '%1'").arg(shownPath));
     if (!in)
         return fail(QStringLiteral("מזהה ספריית הברקודים %1 אינו פתוח").arg(handle));
 
@@ -424,10 +455,10 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     QString written = path;
     if (!direct) {
         if (!scratch.isValid())
-            return fail(QStringLiteral("אין תיקייה זמנית לתמונה"));
+            return failFile(QStringLiteral("אין תיקייה זמנית לתמונה"));
         written = scratch.filePath(QStringLiteral("picture.bmp"));
         if (QFile::encodeName(written).size() >= qsizetype(sizeof symbol->outfile))
-            return fail(QStringLiteral("שם התיקייה הזמנית ארוך מדי"));
+            return failFile(QStringLiteral("שם התיקייה הזמנית ארוך מדי"));
     }
     const QByteArray outfile = QFile::encodeName(written);
     qstrncpy(symbol->outfile, outfile.constData(), sizeof symbol->outfile);
@@ -435,15 +466,27 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     rc = ZBarcode_Print(symbol, in->rotation * 90);
     if (rc >= ZINT_ERROR) {
         QFile::remove(written);
-        return fail(encodeRefusal(rc, *symbol, in->data));
+        const QString why = encodeRefusal(rc, *symbol, in->data);
+        return rc == ZINT_ERROR_FILE_ACCESS || rc == ZINT_ERROR_FILE_WRITE ? failFile(why) : fail(why);
+    }
+    // A cut picture at the page's name would print as a broken barcode.
+    if (!wholeBitmap(written)) {
+        QFile::remove(written);
+        return failFile(QStringLiteral("התמונה '%1' לא נכתבה במלואה (ייתכן שהדיסק מלא)").arg(shownPath));
     }
     if (!direct && !QFile::rename(written, path)) {
         QFile::remove(path);
-        return fail(QStringLiteral("לא ניתן לכתוב את התמונה אל '%1'").arg(QDir::toNativeSeparators(path)));
+        return failFile(QStringLiteral("לא ניתן לכתוב את התמונה אל '%1'").arg(shownPath));
     }
     if (!QFileInfo::exists(path))
-        return fail(QStringLiteral("התמונה '%1' לא נכתבה").arg(QDir::toNativeSeparators(path)));
+        return failFile(QStringLiteral("התמונה '%1' לא נכתבה").arg(shownPath));
     return true;
+}
+
+bool ZintBarcodeLibrary::A1OutputUnwritten(qint32 handle) const
+{
+    const Instance* in = find(handle);
+    return in && in->unwritten;
 }
 
 QString BarcodeImageName(int fieldIndex, int recordNumber)
@@ -471,7 +514,7 @@ int libraryBarType(short barType, LabelBarDef& workingCopy)
 }
 
 bool DrawBarcode(const QString& data, const QString& file, const LabelBarDef& bar, int libraryCode,
-                 BarcodeLibrary& lib, qint32 handle, QString* error)
+                 BarcodeLibrary& lib, qint32 handle, QString* error, bool* unwritten)
 {
     // The designer lets these boxes be cleared or hold nonsense; the library
     // would draw nothing readable from a zero width or ratio. A NaN counts
@@ -501,7 +544,10 @@ bool DrawBarcode(const QString& data, const QString& file, const LabelBarDef& ba
     // library always draws at the printer resolution.
     lib.A1SetUserResoX(handle, 200);
     lib.A1SetUserResoY(handle, 200);
-    return lib.A1OutputBitmap(handle, file, error);
+    const bool made = lib.A1OutputBitmap(handle, file, error);
+    if (unwritten)
+        *unwritten = !made && lib.A1OutputUnwritten(handle);
+    return made;
 }
 
 } // namespace tagora

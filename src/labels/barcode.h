@@ -54,6 +54,10 @@ public:
     // Writes the picture as a BMP file at path. On failure no file is left
     // at path (not even one from an earlier job) and error says why.
     virtual bool A1OutputBitmap(qint32 handle, const QString& path, QString* error) = 0;
+    // Whether the last output on handle failed for the file, not the value:
+    // the picture could not be written whole (a full disk, a folder that
+    // refuses it). Another record would fail the same way, so a job stops.
+    virtual bool A1OutputUnwritten(qint32 handle) const = 0;
     virtual void A1CloseInstance(qint32 handle) = 0;
 };
 
@@ -88,6 +92,7 @@ public:
     void A1SetUserResoX(qint32 handle, int dpi) override;
     void A1SetUserResoY(qint32 handle, int dpi) override;
     bool A1OutputBitmap(qint32 handle, const QString& path, QString* error) override;
+    bool A1OutputUnwritten(qint32 handle) const override;
     void A1CloseInstance(qint32 handle) override;
 
     int openInstances() const { return int(m_instances.size()); }
@@ -111,7 +116,9 @@ QString BarcodeImageName(int fieldIndex, int recordNumber);
 int libraryBarType(short barType, LabelBarDef& workingCopy);
 
 // One picture through the library, with the fixed settings of a label page.
+// unwritten, when given, tells a picture the file could not take from a value
+// the symbology refuses.
 bool DrawBarcode(const QString& data, const QString& file, const LabelBarDef& bar, int libraryCode,
-                 BarcodeLibrary& lib, qint32 handle, QString* error);
+                 BarcodeLibrary& lib, qint32 handle, QString* error, bool* unwritten = nullptr);
 
 } // namespace tagora

@@ -62,8 +62,9 @@ public:
         QByteArray bytes = m_encoder.encode(text);
         if (m_encoder.hasError()) {
             bytes.clear();
+            // One reference per character: a surrogate pair is one code point.
             for (int i = 0; i < text.size(); ++i) {
-                const bool pair = text[i].isHighSurrogate() && i + 1 < text.size();
+                const bool pair = text[i].isHighSurrogate() && i + 1 < text.size() && text[i + 1].isLowSurrogate();
                 const QString one = pair ? text.mid(i, 2) : text.mid(i, 1);
                 QStringEncoder single("windows-1255");
                 QByteArray b = single.encode(one);
@@ -75,13 +76,22 @@ public:
             }
             m_encoder.resetState();
         }
-        if (m_file.write(bytes) != bytes.size())
+        // The buffer hides a failed write from write()'s count; the device's
+        // error shows it once the buffer was flushed.
+        if (!m_failed && (m_file.write(bytes) != bytes.size() || m_file.error() != QFileDevice::NoError))
             m_failed = true;
     }
+
+    // A write that failed (a full disk) fails the page: the rest need not be made.
+    bool failed() const { return m_failed; }
 
     // Puts the page in place; false, with the page left out, when any write failed.
     bool commit()
     {
+        // QSaveFile (Qt 6.4) commits a page whose last buffer the disk refused
+        // (a file size limit, a full disk): the flush is asked first.
+        if (!m_failed && !m_file.flush())
+            m_failed = true;
         if (m_failed) {
             m_file.cancelWriting();
             m_file.commit();
@@ -159,8 +169,9 @@ QString lineText(const LabelLineDef& line, int index, const Statement& record, i
     }
     if (!line.Prefix.isEmpty())
         text = line.Prefix + QLatin1Char(' ') + text;
-    if (maxTextLen > 0 && text.size() > maxTextLen)
-        text = text.left(maxTextLen);
+    // Counted in characters: half an emoji would break the page's markup.
+    if (maxTextLen > 0)
+        text = LeftChars(text, maxTextLen);
     if (logical)
         return nameTableOpen(QStringLiteral("L%1").arg(index)) + QStringLiteral("<td nowrap>") + escaped(text)
             + QStringLiteral("</td></tr></table>");
@@ -332,13 +343,22 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
         if (!bar.LeftPrefix.isEmpty())
             data = bar.LeftPrefix + data;
         QString reason;
-        if (!DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
-                         &reason)
-            && refusals)
+        bool unwritten = false;
+        if (DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
+                        &reason, &unwritten))
+            continue;
+        // A picture the disk would not take is no reason to print labels
+        // without it: every record after it would fail the same way.
+        if (unwritten) {
+            failure = QStringLiteral("לא ניתן לכתוב את תמונות הברקוד בתיקייה '%1', ולכן לא הודפסו מדבקות.\n%2")
+                          .arg(QDir::toNativeSeparators(folder), reason);
+            break;
+        }
+        if (refusals)
             refusals->push_back({record, copiesOf(copiesColumn >= 0 ? records.value(copiesColumn) : QVariant()), data,
                                  reason});
     }
-    if (step == Statement::Step::Error)
+    if (failure.isEmpty() && step == Statement::Step::Error)
         failure = records.error().message;
     library.A1CloseInstance(handle);
     return failure;
@@ -424,10 +444,13 @@ QString LetterTable(const QVariant& value, const QString& className)
     const QString text = value.isValid() && !value.isNull() ? value.toString() : QString();
     QString out = nameTableOpen(className);
     QString previous;
-    for (const QChar c : text) {
+    // A cell per character: a surrogate pair split over two cells is no character at all.
+    for (qsizetype i = 0, units = 1; i < text.size(); i += units) {
+        units = CharUnitsAt(text, i);
+        const QChar c = text[i];
         if (c == kCellSeparator)
             continue;
-        const QString cell = c == QLatin1Char(' ') ? QStringLiteral("&nbsp;") : escaped(QString(c));
+        const QString cell = c == QLatin1Char(' ') ? QStringLiteral("&nbsp;") : escaped(text.mid(i, units));
         if (!(cell == QLatin1String("&nbsp;") && previous == QLatin1String("&nbsp;")))
             out += QStringLiteral("<td>") + cell + QStringLiteral("</td>");
         previous = cell;
@@ -442,14 +465,15 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     if (labels)
         *labels = 0;
     const LabelPageDef& page = layout.page;
-    if (page.PageRows <= 0 || page.PageCols <= 0)
-        return QStringLiteral("מבנה דף המדבקות אינו תקין: %1 שורות, %2 מדבקות בשורה").arg(page.PageRows).arg(page.PageCols);
+    if (const QString why = CheckDirectLayout(layout); !why.isEmpty())
+        return why;
     const QString height = QStringLiteral("height='") + cellPercent(page.PageRows) + QStringLiteral("%'");
     const QString width = QStringLiteral("width='") + cellPercent(page.PageCols) + QStringLiteral("%'");
     const QString picture = pictureAttributes(layout.bar);
     const QString format = priceFormat.trimmed().isEmpty() ? QStringLiteral("0.00") : priceFormat.trimmed();
 
-    const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה").arg(QDir::toNativeSeparators(fileName));
+    const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה (ייתכן שהדיסק מלא), ולכן לא הודפסו מדבקות")
+                                    .arg(QDir::toNativeSeparators(fileName));
     PageWriter out(fileName);
     if (!out.open())
         return QStringLiteral("לא ניתן ליצור את הקובץ '%1'").arg(QDir::toNativeSeparators(fileName));
@@ -532,7 +556,7 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     };
     next();
     int counter = 0;
-    for (long long p = 1; p <= pages && !e; ++p) {
+    for (long long p = 1; p <= pages && !e && !out.failed(); ++p) {
         out.line(QStringLiteral("<table height='100%' width='100%' border='0'>"));
         for (int r = 1; r <= page.PageRows; ++r) {
             out.line(QStringLiteral("  <tr>"));

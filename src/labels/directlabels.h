@@ -38,7 +38,8 @@ QString BarcodeRefusalMessage(const QVector<BarcodeRefusal>& refused, long long 
 
 // The pictures of one barcode line, one per record with a text value, named
 // by field index and record number. Empty text on success; refusals of the
-// symbology are collected, not fatal.
+// symbology are collected, not fatal; a picture that cannot be written whole
+// ends the line with the reason.
 QString MakeBarcodeImages(const QString& folder, const QString& column, int fieldIndex, const QString& dbPath,
                           const QString& sql, LabelBarDef& bar, BarcodeLibrary& library,
                           QVector<BarcodeRefusal>* refusals);

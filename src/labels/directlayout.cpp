@@ -101,6 +101,51 @@ private:
 };
 } // namespace
 
+QString CheckDirectLayout(const DirectLabelLayout& layout)
+{
+    // NaN fails every comparison, so "within" is asked, never "outside".
+    auto outside = [](const QString& name, const char* key, double value, double low, double high) {
+        if (value >= low && value <= high)
+            return QString();
+        return QStringLiteral("ההגדרה \"%1\" (%2) של המדבקה הישירה היא %3, ומותר %4 עד %5. "
+                              "תקנו אותה בהגדרות המדבקה הישירה; לא הודפסו מדבקות.")
+            .arg(name, QLatin1String(key), QString::number(value), QString::number(low), QString::number(high));
+    };
+    const LabelPageDef& p = layout.page;
+    QString why = outside(QStringLiteral("שורות מדבקות בדף"), "PageRows", p.PageRows, 1, 100);
+    if (why.isEmpty())
+        why = outside(QStringLiteral("מדבקות בכל שורה"), "PageCols", p.PageCols, 1, 100);
+    if (why.isEmpty())
+        why = outside(QStringLiteral("שוליים עליונים למדבקה"), "LabTop", p.LabTop, -1000, 1000);
+    if (why.isEmpty())
+        why = outside(QStringLiteral("שוליים תחתונים למדבקה"), "LabBottom", p.LabBottom, -1000, 1000);
+    bool pictures = false;
+    for (int i = 0; i < kDirectLines && why.isEmpty(); ++i) {
+        const LabelLineDef& l = layout.lines[size_t(i)];
+        if (!l.UseCell)
+            continue;
+        pictures = pictures || l.ViewType == 1;
+        why = outside(QStringLiteral("גודל הגופן בשורה %1").arg(i + 1), "FontSize", l.FontSize, 1, 200);
+        // 0 or less leaves the line's height to the browser.
+        if (why.isEmpty() && l.Height > 0)
+            why = outside(QStringLiteral("גובה שורה %1").arg(i + 1), "Height", l.Height, 1, 2000);
+    }
+    // The bar settings make only pictures; a layout without a barcode line
+    // does not answer for them. 0 or less is the usual width or height.
+    const LabelBarDef& b = layout.bar;
+    if (why.isEmpty() && pictures && b.BarType >= 0) {
+        if (b.DimX > 0)
+            why = outside(QStringLiteral("עובי קו הברקוד"), "DimX", b.DimX, 0, 0.5);
+        if (why.isEmpty() && !(b.BarHeight <= 0))
+            why = outside(QStringLiteral("גובה הברקוד"), "BarHeight", b.BarHeight, 0, 10);
+        if (why.isEmpty() && b.UserResoX > 0)
+            why = outside(QStringLiteral("רוחב תמונת הברקוד בדף"), "UserResoX", b.UserResoX, 1, 2000);
+        if (why.isEmpty() && b.UserResoY > 0)
+            why = outside(QStringLiteral("גובה תמונת הברקוד בדף"), "UserResoY", b.UserResoY, 1, 2000);
+    }
+    return why;
+}
+
 void SetGetLabelDefs(int action, DirectLabelLayout& layout, SettingsStore& store)
 {
     if (action != 1 && action != 2)

@@ -46,6 +46,16 @@ struct DirectLabelLayout {
     LabelPageDef page;
 };
 
+// Why the layout cannot make a sheet of labels, naming the setting, or empty
+// text when it can. Each number must lie within what a printed sheet holds:
+// PageRows and PageCols 1-100, LabTop and LabBottom -1000 to 1000; on a line
+// in use FontSize 1-200 points and Height up to 2000 points; with a barcode
+// line in use DimX up to 0.5 and BarHeight up to 10 inches, UserResoX and
+// UserResoY up to 2000 pixels. The settings that mean "not set" (0 or less)
+// stay allowed. Checked before a job touches anything, so a sheet of 32,767
+// by 32,767 labels is refused at once instead of written for minutes.
+QString CheckDirectLayout(const DirectLabelLayout& layout);
+
 // The layout of this process, shared by every control on its thread.
 DirectLabelLayout& directLabelLayout();
 

@@ -1,6 +1,7 @@
 #include "labels/itemquery.h"
 
 #include "localdb/conversions.h"
+#include "localdb/database.h"
 
 namespace tagora {
 
@@ -11,7 +12,30 @@ QString quoted(const QString& value)
     v.replace(QLatin1Char('\''), QLatin1String("''"));
     return v;
 }
+
+// The expression as the query holds it: a double quote is an apostrophe.
+QString expressionSql(const QString& typed)
+{
+    QString expression = typed;
+    expression.replace(QLatin1Char('"'), QLatin1Char('\''));
+    return expression;
+}
 } // namespace
+
+QString CheckItemQuery(const LabelQuerySettings& s)
+{
+    for (int row = FirstExpressionRow; row < LabelFieldCount; ++row) {
+        if (!RowIsSent(s, row) || !HoldsStatementEnd(expressionSql(s.expressions[size_t(row)])))
+            continue;
+        // Cut at that ';', the query would run without its conditions, or run
+        // whatever the expression adds after it.
+        return QStringLiteral("הביטוי בשורה \"%1\" (%2) בלשונית הנתונים הנוספים מכיל ';' שמסיים את הפקודה. "
+                              "ביטוי הוא חלק מפקודה אחת: הסירו את ה-';' (בתוך מחרוזת, כמו 'a;b', הוא מותר). "
+                              "לא הודפסו מדבקות.")
+            .arg(QString::fromUtf8(labelField(row).description), QLatin1String(labelField(row).name));
+    }
+    return QString();
+}
 
 QString ItemRangeCriteria(const QString& fromItem, const QString& toItem, const QString& fromSort,
                           const QString& toSort)
@@ -146,9 +170,8 @@ QString BuildItemQuery(const LabelQuerySettings& s, int queryType, int orderBy)
     for (int row = FirstExpressionRow; row < LabelFieldCount; ++row) {
         if (!RowIsSent(s, row))
             continue;
-        QString expression = s.expressions[size_t(row)];
-        expression.replace(QLatin1Char('"'), QLatin1Char('\''));
-        sql += QStringLiteral(", (") + expression + QStringLiteral(") AS ") + QLatin1String(labelField(row).column);
+        sql += QStringLiteral(", (") + expressionSql(s.expressions[size_t(row)]) + QStringLiteral(") AS ")
+            + QLatin1String(labelField(row).column);
     }
 
     sql += QStringLiteral(" FROM tItems");

@@ -34,6 +34,12 @@ bool RowIsSent(const LabelQuerySettings& settings, int row);
 // SQL of their own, with double quotes taken as apostrophes.
 QString BuildItemQuery(const LabelQuerySettings& settings, int queryType, int orderBy);
 
+// Why the label-data query cannot be built from these settings, naming the
+// expression row, or empty text. An expression is part of one statement: a
+// ';' that would end it (one outside a literal; 'a;b' is text) is refused,
+// the same for printing through a label program and for direct labels.
+QString CheckItemQuery(const LabelQuerySettings& settings);
+
 // " And ItemKey >= '...'" and so on for the non-empty trimmed bounds, with
 // unqualified column names so the single-table dialog queries can use it too.
 QString ItemRangeCriteria(const QString& fromItem, const QString& toItem, const QString& fromSort,

@@ -242,6 +242,18 @@ QString Statement::sql() const
 
 // ------------------------------------------------------------------- Database
 
+bool HoldsStatementEnd(const QString& sqlPart)
+{
+    // The engine's own reading of literals, quoted names and comments: a text
+    // that reads as complete up to a ';' ends a statement there. The opening
+    // keeps a CREATE TRIGGER in the piece from hiding its ';'.
+    const QByteArray text = "SELECT (" + sqlPart.toUtf8();
+    for (qsizetype i = text.indexOf(';'); i >= 0; i = text.indexOf(';', i + 1))
+        if (sqlite3_complete(text.left(i + 1).constData()))
+            return true;
+    return false;
+}
+
 void Database::setBusyTimeout(int ms)
 {
     s_busyTimeoutMs = ms;
@@ -250,6 +262,13 @@ void Database::setBusyTimeout(int ms)
 int Database::busyTimeout()
 {
     return s_busyTimeoutMs;
+}
+
+void Database::setBusyWait(int ms)
+{
+    m_busyWaitMs = ms;
+    if (m_db)
+        sqlite3_busy_timeout(m_db, ms >= 0 ? ms : s_busyTimeoutMs);
 }
 
 Database::~Database()
@@ -267,6 +286,11 @@ DbError Database::lastError(int rc) const
     e.message = m_db ? QString::fromUtf8(sqlite3_errmsg(m_db)) : QString::fromUtf8(sqlite3_errstr(rc));
     if (e.code == SQLITE_CONSTRAINT_PRIMARYKEY || e.code == SQLITE_CONSTRAINT_UNIQUE)
         e.kind = DbError::Kind::DuplicateKey;
+    // Another program (or window) holds the file for the whole wait: the user
+    // can do nothing about the engine's words, only try again later.
+    if ((e.code & 0xff) == SQLITE_BUSY)
+        e.message = QStringLiteral("הקובץ '%1' תפוס כעת בידי תוכנה אחרת או חלון אחר, ולכן הפעולה לא בוצעה. נסו שוב בעוד רגע.")
+                        .arg(QDir::toNativeSeparators(m_path));
     else if ((e.code & 0xff) == SQLITE_CANTOPEN)
         e.kind = DbError::Kind::NotFound;
     // A linked table that is not there because its file could not be linked:
@@ -307,14 +331,15 @@ DbError Database::open(const QString& path, OpenMode mode)
     }
     m_path = info.absoluteFilePath();
     sqlite3_extended_result_codes(m_db, 1);
-    sqlite3_busy_timeout(m_db, s_busyTimeoutMs);
+    sqlite3_busy_timeout(m_db, m_busyWaitMs >= 0 ? m_busyWaitMs : s_busyTimeoutMs);
 
     // A file that is not a database, or one another program holds locked,
     // shows here rather than at the first query.
     DbError e;
     scalar(QStringLiteral("SELECT count(*) FROM main.sqlite_master"), &e);
     if (e) {
-        e.message += QStringLiteral(" (%1)").arg(QDir::toNativeSeparators(path));
+        if (!e.message.contains(QDir::toNativeSeparators(m_path)))
+            e.message += QStringLiteral(" (%1)").arg(QDir::toNativeSeparators(path));
         close();
         return e;
     }
@@ -352,18 +377,51 @@ Statement Database::prepare(const QString& sql, DbError* error) const
     }
     sqlite3_stmt* stmt = nullptr;
     const QByteArray text = sql.toUtf8();
-    const int rc = sqlite3_prepare_v2(m_db, text.constData(), int(text.size()), &stmt, nullptr);
-    if (rc != SQLITE_OK) {
+    const char* tail = nullptr;
+    const int rc = sqlite3_prepare_v2(m_db, text.constData(), int(text.size()), &stmt, &tail);
+    DbError e;
+    if (rc != SQLITE_OK)
+        e = lastError(rc);
+    else if (const QString rest = trailingStatement(tail, text.constData() + text.size()); !rest.isEmpty())
+        e = DbError::other(QStringLiteral("השאילתה מכילה יותר מפקודה אחת, ומה שאחרי ה-';' לא יורץ: \"%1\"").arg(rest));
+    if (e) {
         if (error)
-            *error = lastError(rc);
+            *error = e;
         sqlite3_finalize(stmt);
         Statement failed;
-        failed.m_error = lastError(rc);
+        failed.m_error = e;
         return failed;
     }
     if (error)
         *error = {};
     return Statement(this, stmt);
+}
+
+// The engine compiles the first statement of a text and stops at its ';'.
+// Whatever statement follows would be dropped without a word (or a query cut
+// short by a ';' inside it would run as a different query), so a prepared
+// text must be one statement; only blanks, comments and empty statements may
+// follow it. The engine's own parser tells: a literal holding ';' is no end.
+QString Database::trailingStatement(const char* tail, const char* end) const
+{
+    while (tail && tail < end) {
+        while (tail < end && (*tail == ' ' || *tail == '\t' || *tail == '\r' || *tail == '\n'))
+            ++tail;
+        if (tail >= end)
+            break;
+        sqlite3_stmt* next = nullptr;
+        const char* after = nullptr;
+        const int rc = sqlite3_prepare_v2(m_db, tail, int(end - tail), &next, &after);
+        sqlite3_finalize(next);
+        if (rc != SQLITE_OK || next || !after || after <= tail) {
+            QString rest = QString::fromUtf8(tail, int(end - tail)).simplified();
+            if (rest.size() > 60)
+                rest = rest.left(60) + QStringLiteral("...");
+            return rest;
+        }
+        tail = after;
+    }
+    return QString();
 }
 
 QVariant Database::scalar(const QString& sql, DbError* error) const

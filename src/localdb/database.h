@@ -106,6 +106,8 @@ public:
 
     // Runs one or more statements that return no rows.
     DbError exec(const QString& sql);
+    // One statement: a text that goes on with another after its ';' is
+    // refused, not cut (a ';' inside a literal is text, not an end).
     Statement prepare(const QString& sql, DbError* error = nullptr) const;
     // The first column of the first row, or a null value.
     QVariant scalar(const QString& sql, DbError* error = nullptr) const;
@@ -139,6 +141,10 @@ public:
     // for databases opened from now on.
     static void setBusyTimeout(int ms);
     static int busyTimeout();
+    // This connection's own wait, for work a user waits on with the screen
+    // still (a click in a grid); negative gives back the shared one. Applies
+    // at once and to the next open.
+    void setBusyWait(int ms);
 
     sqlite3* handle() const { return m_db; }
     DbError lastError(int rc) const;
@@ -146,6 +152,7 @@ public:
 private:
     enum class LinkFault { Missing, NoTable, Unreadable };
 
+    QString trailingStatement(const char* tail, const char* end) const;
     DbError ensureCatalog();
     void openLinks();
     void createQueryView(const QString& name, const QString& sql);
@@ -154,6 +161,7 @@ private:
                                const DbError& cause = {});
 
     sqlite3* m_db = nullptr;
+    int m_busyWaitMs = -1;
     QString m_path;
     std::vector<std::pair<QString, QString>> m_attached; // source path -> alias
     std::map<QString, DbError> m_linkProblems;            // lower-case linked table -> why it is not there
@@ -172,6 +180,11 @@ private:
     bool m_active = false;
     DbError m_error;
 };
+
+// Whether a piece of SQL meant to sit inside a statement (an expression the
+// user typed) holds a ';' that would end that statement: one outside string
+// literals, quoted names and comments ('a;b' is text).
+bool HoldsStatementEnd(const QString& sqlPart);
 
 // Name of the table in every file that records its links and stored queries.
 inline const QString kCatalogTable = QStringLiteral("tgrObjects");

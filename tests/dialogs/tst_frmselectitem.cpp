@@ -179,6 +179,41 @@ private slots:
             QVERIFY2(prompt->lines().first().contains(QString::fromUtf8("עותקים")), qPrintable(prompt->lines().first()));
     }
 
+    // Another program holds the items file in a transaction: the change is
+    // refused after a short wait, the user reads that the file is busy, and
+    // the grid shows what the file holds, not the marks that were not saved.
+    void lockedItemsFile_data()
+    {
+        QTest::addColumn<QString>("action");
+        QTest::newRow("mark all") << "CmdAllItems";
+        QTest::newRow("copies for the marked") << "CmdAllCopies";
+        QTest::newRow("a tick in the grid") << "tick";
+    }
+    void lockedItemsFile()
+    {
+        QFETCH(QString, action);
+        fill("INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel) VALUES ('A1', 'x', 1, 1), ('B2', 'y', 1, 0)");
+        auto prompt = std::make_shared<ScriptedPrompt>(nullptr);
+        FrmSelectItem f(folder, QString(), nullptr, prompt);
+        c<QLineEdit>(f, "txtAllCopis")->setText("7");
+        Database holder;
+        QVERIFY(!holder.open(items));
+        QVERIFY(!holder.exec("BEGIN EXCLUSIVE"));
+        if (action == "tick")
+            f.model()->setData(f.model()->index(1, 2), Qt::Checked, Qt::CheckStateRole);
+        else
+            c<QPushButton>(f, action)->click();
+        QVERIFY(!holder.exec("ROLLBACK"));
+
+        QCOMPARE(prompt->lines().size(), 1);
+        QVERIFY2(prompt->lines().first().contains(QString::fromUtf8("תפוס")), qPrintable(prompt->lines().first()));
+        QCOMPARE(QStringList({grid(f)->text(0, 1), grid(f)->text(0, 2), grid(f)->text(0, 3), grid(f)->text(1, 1),
+                              grid(f)->text(1, 2), grid(f)->text(1, 3)}),
+                 QStringList({"A1", "1", "1", "B2", "0", "1"}));
+        QCOMPARE(rows(items, "SELECT ItemKey, PrintLabel, Copies FROM tItems ORDER BY ItemKey"),
+                 QStringList({"A1|1|1", "B2|0|1"}));
+    }
+
     // The card column opens the row's item from the source chosen, and the
     // print button runs the control's print, through what the dialog was given.
     void cardColumnAndPrintReachTheControl()

@@ -30,6 +30,9 @@ private slots:
         QTest::newRow("latin word keeps order") << chars("םוקמ ABC") << chars("ABC מקום");
         QTest::newRow("decimal number") << chars("ח\"ש 12.50") << chars("12.50 ש\"ח");
         QTest::newRow("empty") << QString() << QString();
+        // A character beyond the basic plane moves whole.
+        QTest::newRow("emoji") << chars("םולש 😀") << chars("😀 שלום");
+        QTest::newRow("math letter after a run") << chars("AB𝐀 א") << chars("א 𝐀AB");
     }
     void visualToLogical()
     {
@@ -72,6 +75,8 @@ private slots:
         QTest::newRow("mirrored") << 1 << QString("(<") << QString(S) + '>' + S + ')' + S;
         QTest::newRow("type 2 keeps mirror") << 2 << QString("(<") << QString(S) + ')' + S + '>' + S;
         QTest::newRow("empty") << 1 << QString() << QString(S);
+        QTest::newRow("type 1, emoji whole") << 1 << chars("א😀") << QString(S) + chars("😀") + S + chars("א") + S;
+        QTest::newRow("type 2, math letter whole") << 2 << chars("𝐀(") << QString(S) + chars("𝐀") + S + ')' + S;
     }
     void reverseForCells()
     {
@@ -79,7 +84,8 @@ private slots:
         QFETCH(QString, text);
         QFETCH(QString, cells);
         QCOMPARE(ReverseForCells(text, short(type)), cells);
-        QCOMPARE(cells.size(), text.size() * 2 + 1);
+        // A separator before each character and one at the end.
+        QCOMPARE(cells.size(), text.size() + CharCount(text) + 1);
     }
 
     void hebrewLetters_data()

@@ -1,3 +1,5 @@
+#include "support/filelimit.h"
+
 #include "labels/barcode.h"
 
 #include <QDir>
@@ -20,12 +22,13 @@ void writeStale(const QString& path)
 }
 
 // Draws one picture the way a label line does: translation, one handle, one call.
-bool drawWithZint(short position, const QString& data, LabelBarDef bar, const QString& file, QString* error)
+bool drawWithZint(short position, const QString& data, LabelBarDef bar, const QString& file, QString* error,
+                  bool* unwritten = nullptr)
 {
     ZintBarcodeLibrary lib;
     const int code = libraryBarType(position, bar);
     const qint32 handle = lib.A1OpenInstance();
-    const bool ok = DrawBarcode(data, file, bar, code, lib, handle, error);
+    const bool ok = DrawBarcode(data, file, bar, code, lib, handle, error, unwritten);
     lib.A1CloseInstance(handle);
     return ok;
 }
@@ -177,6 +180,9 @@ private slots:
         QTest::newRow("Hebrew in CODE-39 Ascii") << 1 << "AB-א" << false << "CODE-39 Ascii" << "התו 'א' אינו חוקי";
         QTest::newRow("CODE-128 too long") << 2 << QString(161, 'A') << false << "CODE-128" << "ארוך מדי";
         QTest::newRow("Hebrew in CODE-128") << 2 << "שלום 12" << false << "CODE-128" << "התו 'ש' אינו חוקי";
+        // A character beyond the basic plane is named whole, never half a pair.
+        QTest::newRow("emoji in CODE-128") << 2 << "AB😀" << false << "CODE-128" << "התו '😀' אינו חוקי";
+        QTest::newRow("math letter in CODE-128B") << 4 << "𝐀1" << false << "CODE-128B" << "התו '𝐀' אינו חוקי";
         QTest::newRow("lower case in CODE-128A") << 3 << "abc" << false << "CODE-128A" << "התו 'a' אינו חוקי";
         QTest::newRow("control character in CODE-128B") << 4 << "A\tB" << false << "CODE-128B" << "תו הבקרה שקודו 9";
         QTest::newRow("odd count in 2 of 5") << 7 << "12345" << false << "Interleaved 2 of 5" << "מספר זוגי של ספרות";
@@ -197,7 +203,9 @@ private slots:
         bar.CheckDigit = checkDigit;
         QString error;
 
-        QVERIFY(!drawWithZint(short(position), data, bar, file, &error));
+        bool unwritten = true;
+        QVERIFY(!drawWithZint(short(position), data, bar, file, &error, &unwritten));
+        QVERIFY(!unwritten); // the value, not the file: the job goes on
 
         QVERIFY2(error.contains(reason), qPrintable(error));
         QVERIFY2(error.contains(type), qPrintable(error));
@@ -245,6 +253,42 @@ private slots:
         QVERIFY2(drawWithZint(short(position), data, bar, file, &error), qPrintable(error));
 
         QCOMPARE(QImage(file, "BMP").size(), size);
+    }
+
+    // A disk that fills up while zint writes: zint reports success on a cut
+    // file, so the picture is measured, and none is left at the page's name.
+    void fullDisk_data()
+    {
+        QTest::addColumn<int>("limit");
+        QTest::addColumn<bool>("made");
+        QTest::newRow("nothing written") << 0 << false;
+        QTest::newRow("cut short") << 1000 << false;
+        QTest::newRow("room enough") << (1 << 20) << true;
+    }
+    void fullDisk()
+    {
+        QFETCH(int, limit);
+        QFETCH(bool, made);
+        QTemporaryDir dir;
+        const QString file = dir.filePath(BarcodeImageName(4, 1));
+        const LimitedRun run = runWithFileLimit(rlim_t(limit), [&] {
+            ZintBarcodeLibrary lib;
+            const qint32 handle = lib.A1OpenInstance();
+            QString error;
+            bool unwritten = false;
+            const bool ok = DrawBarcode(QStringLiteral("7290000000015"), file, LabelBarDef(), 1, lib, handle, &error, &unwritten);
+            return QStringLiteral("%1|%2|%3").arg(ok).arg(unwritten).arg(error).toUtf8();
+        });
+        QVERIFY(run.exited);
+        const QStringList report = QString::fromUtf8(run.report).split('|');
+        QCOMPARE(report.size(), 3);
+        QCOMPARE(report[0], QString::number(made));
+        QCOMPARE(report[1], QString::number(!made)); // the file, not the value
+        QCOMPARE(QFile::exists(file), made);
+        if (made)
+            QCOMPARE(decode(file).second, QStringLiteral("7290000000015"));
+        else
+            QVERIFY2(report[2].contains(QStringLiteral("לא נכתבה במלואה")), qPrintable(report[2]));
     }
 
     void closedHandle()

@@ -1,5 +1,6 @@
 // The direct-label page, its pictures and the job as the print button runs it.
 #include "support/cardfixture.h"
+#include "support/filelimit.h"
 #include "support/labeldata.h"
 
 #include "erp/textconv.h"
@@ -16,6 +17,7 @@
 #include <QStringDecoder>
 #include <QtTest>
 
+#include <map>
 #include <sys/stat.h>
 
 using namespace tagora;
@@ -169,6 +171,11 @@ private slots:
         QTest::newRow("markup is text") << "" << 0 << "<b>&'x'" << false << "" << "&lt;b&gt;&amp;&#39;x&#39;";
         // The page is in the Hebrew code page; what it lacks goes as a character reference.
         QTest::newRow("code page") << "" << 0 << "בורג ش €" << false << "" << "בורג &#1588; €";
+        // Beyond the basic plane: one reference per character, and a cut that
+        // counts characters keeps an emoji whole.
+        QTest::newRow("emoji and math letter") << "" << 0 << "😀 𝐀" << false << "" << "&#128512; &#119808;";
+        QTest::newRow("cut after an emoji") << "" << 2 << "😀😀😀" << false << "" << "&#128512;&#128512;";
+        QTest::newRow("cut counts the prefix's emoji") << "😀" << 3 << "𝐀bc" << false << "" << "&#128512; &#119808;";
     }
     void cellText()
     {
@@ -263,6 +270,7 @@ private slots:
         QTest::newRow("run of blanks is one cell") << QVariant("a  b") << "L2" << "<td>a</td><td>&nbsp;</td><td>b</td>";
         QTest::newRow("separators dropped") << QVariant(sep + "x" + sep + "<" + sep) << "" << "<td>x</td><td>&lt;</td>";
         QTest::newRow("null") << QVariant() << "L1" << "";
+        QTest::newRow("emoji is one cell") << QVariant("a😀" + sep + "𝐀") << "" << "<td>a</td><td>😀</td><td>𝐀</td>";
     }
     void letterTable()
     {
@@ -288,6 +296,8 @@ private slots:
         QTest::newRow("type 2, Latin") << 2 << "Makita DHP482 (18V)" << "text:Makita DHP482 (18V)";
         QTest::newRow("type 2, Hebrew") << 2 << "מקדחה" << "text:מקדחה";
         QTest::newRow("type 2, mixed") << 2 << "מקדחה (Makita 18V) <2>" << "text:מקדחה (Makita 18V) <2>";
+        QTest::newRow("type 1, emoji") << 1 << "😀 𝐀 החדקמ" << "cells:&#128512; &#119808; החדקמ";
+        QTest::newRow("type 2, emoji") << 2 << "מקדחה 😀𝐀" << "text:מקדחה &#128512;&#119808;";
     }
     void nameLineReads()
     {
@@ -424,6 +434,99 @@ private slots:
         QVERIFY2(shown.startsWith(QString::fromUtf8("שימו לב: 4 מתוך 9 המדבקות שבדף")), qPrintable(shown));
         QVERIFY2(shown.contains("729000000001X") && shown.contains("EAN-13"), qPrintable(shown));
         QVERIFY2(!shown.contains(QRegularExpression("Error|Invalid|digits")), qPrintable(shown));
+    }
+
+    // A disk that fills up during the job: the pictures or the page cannot be
+    // written whole, so nothing is shown as printed; the user reads why.
+    void fullDiskStopsTheJob_data()
+    {
+        QTest::addColumn<bool>("pictures");
+        QTest::newRow("barcode pictures") << true;
+        QTest::newRow("the page") << false;
+    }
+    void fullDiskStopsTheJob()
+    {
+        QFETCH(bool, pictures);
+        LabelData data;
+        const QString ini = pictures ? "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=2\n"
+                                     : "[LabelDef0]\nUseCell=-1\nFldID=0\n";
+        const auto f = directCard(data, work.filePath(QStringLiteral("full%1").arg(pictures)), ini);
+        // Smaller than a picture or a page, larger than nothing.
+        const LimitedRun run = runWithFileLimit(1000, [&] {
+            f->c<QPushButton>("cmdPrintItmes")->click();
+            return (QStringList{QString::number(f->pages->shown.size())} + f->prompt->lines()).join(QChar(0x1e)).toUtf8();
+        });
+        QVERIFY(run.exited);
+        const QStringList report = QString::fromUtf8(run.report).split(QChar(0x1e));
+        QCOMPARE(report.first(), QStringLiteral("0")); // no page shown
+        QCOMPARE(report.size(), 2);                     // one message: no "attention" for missing barcodes
+        QVERIFY2(report[1].startsWith(QString::fromUtf8("תקלה: ")), qPrintable(report[1]));
+        QVERIFY2(report[1].contains(QString::fromUtf8("לא הודפסו מדבקות")), qPrintable(report[1]));
+    }
+
+    // A layout no sheet can hold is refused, naming the setting, before any
+    // picture or page is made; up to the bounds it prints.
+    void layoutBounds_data()
+    {
+        QTest::addColumn<QString>("key");
+        QTest::addColumn<double>("value");
+        QTest::addColumn<bool>("refused");
+        QTest::newRow("32767 rows") << "PageRows" << 32767.0 << true;
+        QTest::newRow("no columns") << "PageCols" << 0.0 << true;
+        QTest::newRow("100 columns") << "PageCols" << 100.0 << false;
+        QTest::newRow("huge margin") << "LabTop" << 32767.0 << true;
+        QTest::newRow("font of 255 points") << "FontSize" << 255.0 << true;
+        QTest::newRow("line of 32767 points") << "Height" << 32767.0 << true;
+        QTest::newRow("narrow bar of an inch") << "DimX" << 1.0 << true;
+        QTest::newRow("bars 3000 inches high") << "BarHeight" << 3000.0 << true;
+        QTest::newRow("picture 32767 wide") << "UserResoX" << 32767.0 << true;
+        QTest::newRow("picture shown at natural size") << "UserResoY" << -1.0 << false;
+    }
+    void layoutBounds()
+    {
+        QFETCH(QString, key);
+        QFETCH(double, value);
+        QFETCH(bool, refused);
+        LabelData data;
+        DirectLabelLayout& layout = directLabelLayout();
+        const std::map<QString, std::function<void(double)>> set{
+            {"PageRows", [&](double v) { layout.page.PageRows = short(v); }},
+            {"PageCols", [&](double v) { layout.page.PageCols = short(v); }},
+            {"LabTop", [&](double v) { layout.page.LabTop = short(v); }},
+            {"FontSize", [&](double v) { layout.lines[0].FontSize = uchar(v); }},
+            {"Height", [&](double v) { layout.lines[0].Height = short(v); }},
+            {"DimX", [&](double v) { layout.bar.DimX = float(v); }},
+            {"BarHeight", [&](double v) { layout.bar.BarHeight = float(v); }},
+            {"UserResoX", [&](double v) { layout.bar.UserResoX = short(v); }},
+            {"UserResoY", [&](double v) { layout.bar.UserResoY = short(v); }},
+        };
+        const QString temp = work.filePath("bounds-" + key);
+        const QString earlier = temp + "/tgrlab/tgrlab1.htm";
+        QVERIFY(QDir().mkpath(temp + "/tgrlab"));
+        QFile old(earlier);
+        QVERIFY(old.open(QIODevice::WriteOnly));
+        old.write("earlier page");
+        old.close();
+
+        const auto f = directCard(data, temp, "[LabelBar]\nBarType=2\n");
+        layout.lines[0] = textLine(0, "ItemKey");
+        layout.lines[1] = textLine(4, "BarCode");
+        layout.lines[1].ViewType = 1;
+        set.at(key)(value);
+        f->c<QPushButton>("cmdPrintItmes")->click();
+
+        QCOMPARE(f->pages->shown.size(), refused ? 0 : 1);
+        QCOMPARE(f->prompt->criticalCount(), refused ? 1 : 0);
+        if (refused) {
+            QVERIFY2(f->prompt->lines().first().contains("(" + key + ")"), qPrintable(f->prompt->lines().first()));
+            // Nothing of the job was started: the last job's page is as it was, no picture made.
+            QVERIFY(old.open(QIODevice::ReadOnly));
+            QCOMPARE(old.readAll(), QByteArray("earlier page"));
+            QCOMPARE(QDir(temp + "/tgrlab").entryList(QDir::Files), QStringList{"tgrlab1.htm"});
+            // A host's page is refused the same way.
+            QVERIFY(CreateLabPage(work.filePath("bounds.htm"), data.docs, "SELECT 1 AS Copies", layout, "0.00", nullptr)
+                        .contains("(" + key + ")"));
+        }
     }
 
     // A page that fails after its head leaves nothing of itself behind; an

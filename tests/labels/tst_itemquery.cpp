@@ -137,6 +137,41 @@ private slots:
         QVERIFY(!RowIsSent(s, 33));
         QVERIFY(RowIsSent(s, 34));
     }
+
+    // An expression is part of one statement. A ';' that ends it would leave
+    // the query's conditions behind (every item, marked or not) or run what
+    // follows; one inside a literal or a comment is text.
+    void statementEndInExpression_data()
+    {
+        QTest::addColumn<QString>("expression");
+        QTest::addColumn<QString>("value"); // empty: refused
+        QTest::newRow("query cut before its conditions") << "1) AS EX1 FROM tItems; SELECT (1" << "";
+        QTest::newRow("closing semicolon") << "tItems.Unit;" << "";
+        QTest::newRow("in a literal") << "'a;b'" << "a;b";
+        QTest::newRow("in a double-quoted literal") << "\"x;\" || tItems.Unit" << "x;pc";
+        QTest::newRow("in a comment") << "tItems.Unit /* ; */" << "pc";
+    }
+    void statementEndInExpression()
+    {
+        QFETCH(QString, expression);
+        QFETCH(QString, value);
+        LabelQuerySettings s = sending({33});
+        s.expressions[33] = expression;
+        const QString problem = CheckItemQuery(s);
+        const QString sql = BuildItemQuery(s, 1, 1);
+        if (!value.isEmpty()) {
+            QVERIFY2(problem.isEmpty(), qPrintable(problem));
+            QCOMPARE(rows(data.docs, "SELECT EX1 FROM (" + sql + ")"), QStringList(3, value));
+            return;
+        }
+        QVERIFY(problem.contains(QStringLiteral("\"ביטוי 1\" (EX1)")));
+        // Nor does the database run the query cut short.
+        Database db;
+        QVERIFY(!db.open(data.docs, Database::OpenMode::ReadOnly));
+        DbError e;
+        db.prepare(sql, &e);
+        QVERIFY(e.isError());
+    }
 };
 
 QTEST_GUILESS_MAIN(TestItemQuery)

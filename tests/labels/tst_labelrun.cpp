@@ -2,6 +2,7 @@
 #include "support/cardfixture.h"
 #include "support/labeldata.h"
 
+#include "labels/directlayout.h"
 #include "labels/itemquery.h"
 #include "labels/labelprograms.h"
 #include "labels/labelrun.h"
@@ -331,6 +332,41 @@ private slots:
         const QStringList lines = readJournal(journal);
         QVERIFY(lines.filter("\"EX1\"").isEmpty());
         QCOMPARE(lines.filter("\"EX2\", \"pc\"").size(), 3);
+    }
+
+    // An expression with a ';' that ends the statement is refused before
+    // anything is printed, in the same words whichever way the labels go.
+    void statementEndRefusedOnBothPaths_data()
+    {
+        QTest::addColumn<bool>("direct");
+        QTest::newRow("label program") << false;
+        QTest::newRow("direct labels") << true;
+    }
+    void statementEndRefusedOnBothPaths()
+    {
+        QFETCH(bool, direct);
+        LabelData data;
+        const QString journal = work.filePath(QStringLiteral("statements%1.txt").arg(++runs));
+        qputenv("Temp", work.filePath(QStringLiteral("temp%1").arg(runs)).toUtf8());
+        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\nOptOLE0=%3\nOptOLE3=%4\n"
+                                     "[LabelDef0]\nUseCell=-1\nFldID=0\n")
+                          .arg(journal, data.folder, direct ? "False" : "True", direct ? "True" : "False")
+                          .toUtf8());
+        const QString expression = QStringLiteral("1) AS EX1 FROM tItems; SELECT (1");
+        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
+        f.c<QCheckBox>("ChkFldSend(33)")->setChecked(true);
+        f.c<QLineEdit>("txtFldExpr(33)")->setText(expression);
+        f.c<QPushButton>("cmdPrintItmes")->click();
+        directLabelLayout() = DirectLabelLayout{};
+        qunsetenv("Temp");
+
+        LabelQuerySettings settings;
+        settings.sent[33] = true;
+        settings.expressions[33] = expression;
+        QCOMPARE(f.prompt->lines(), QStringList{QString::fromUtf8("תקלה: ") + CheckItemQuery(settings)});
+        QVERIFY(f.pages->shown.isEmpty());
+        QVERIFY(readJournal(journal).isEmpty());
+        QVERIFY(f.card->message() != QString::fromUtf8("הכנת המדבקות הסתיימה"));
     }
 };
 

@@ -2,6 +2,7 @@
 
 #include <QDir>
 #include <QFile>
+#include <QFileInfo>
 #include <QTemporaryDir>
 #include <QtTest>
 
@@ -142,8 +143,67 @@ private slots:
         Database other;
         const DbError e = other.open(path);
         QVERIFY(e.isError());
-        QVERIFY(e.message.contains("locked"));
+        // In words the user can act on, naming the file once.
+        QVERIFY2(e.message.contains(QString::fromUtf8("תפוס")), qPrintable(e.message));
+        QCOMPARE(e.message.count(QDir::toNativeSeparators(QFileInfo(path).absoluteFilePath())), 1);
         holder.exec("ROLLBACK");
+    }
+
+    // A prepared text is one statement: what follows its ';' would be dropped
+    // without a word, so it is refused; blanks, comments and empty statements
+    // may follow.
+    void oneStatementPrepared_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::addColumn<bool>("refused");
+        QTest::newRow("second statement") << "SELECT count(*) FROM t; DELETE FROM t" << true;
+        QTest::newRow("statement after a comment") << "SELECT count(*) FROM t; -- then\nDELETE FROM t" << true;
+        QTest::newRow("words after") << "SELECT count(*) FROM t; nonsense" << true;
+        QTest::newRow("closing semicolon") << "SELECT count(*) FROM t;" << false;
+        QTest::newRow("empty statements and a comment") << "SELECT count(*) FROM t; ; -- done" << false;
+        QTest::newRow("semicolon in a literal") << "SELECT count(*) FROM t WHERE a <> 'x;y'" << false;
+    }
+    void oneStatementPrepared()
+    {
+        QFETCH(QString, sql);
+        QFETCH(bool, refused);
+        const QString path = fresh("one.db");
+        Database db;
+        QVERIFY(!db.open(path, Database::OpenMode::Create));
+        QVERIFY(!db.exec("CREATE TABLE t (a); INSERT INTO t VALUES (1)"));
+        DbError e;
+        Statement s = db.prepare(sql, &e);
+        QCOMPARE(e.isError(), refused);
+        QCOMPARE(s.isValid(), !refused);
+        if (refused) {
+            QVERIFY2(e.message.contains(QString::fromUtf8("יותר מפקודה אחת")), qPrintable(e.message));
+            QCOMPARE(s.step(), Statement::Step::Error);
+        } else {
+            QCOMPARE(s.step(), Statement::Step::Row);
+            QCOMPARE(s.value(0).toInt(), 1);
+        }
+    }
+
+    // A piece of SQL for the inside of a statement: only a ';' the engine
+    // reads as an end counts.
+    void statementEndInPiece_data()
+    {
+        QTest::addColumn<QString>("piece");
+        QTest::addColumn<bool>("ends");
+        QTest::newRow("bare") << "a; DELETE FROM t" << true;
+        QTest::newRow("after a closing bracket") << "1) FROM t; SELECT (1" << true;
+        QTest::newRow("trigger words") << "create trigger x; select 1" << true;
+        QTest::newRow("literal") << "'a;b'" << false;
+        QTest::newRow("literal with a doubled apostrophe") << "'it''s;' || a" << false;
+        QTest::newRow("quoted name") << "\"a;b\" + [c;d]" << false;
+        QTest::newRow("comments") << "a /* ; */ -- ;" << false;
+        QTest::newRow("none") << "a || 'b'" << false;
+    }
+    void statementEndInPiece()
+    {
+        QFETCH(QString, piece);
+        QFETCH(bool, ends);
+        QCOMPARE(HoldsStatementEnd(piece), ends);
     }
 
     void linksAndQueries()
