@@ -76,6 +76,10 @@ private slots:
                        "-f", script});
         QVERIFY(p.waitForFinished(120000));
         QVERIFY2(p.exitCode() == 0, p.readAllStandardError().constData());
+        p.start(psql, {"-h", "127.0.0.1", "-p", port, "-U", "postgres", "-d", "postgres", "-q", "-v", "ON_ERROR_STOP=1",
+                       "-c", "CREATE SEQUENCE IF NOT EXISTS tagora_probe_seq"});
+        QVERIFY(p.waitForFinished(60000));
+        QVERIFY2(p.exitCode() == 0, p.readAllStandardError().constData());
         odbc.addDsn("TagoraPg", {{"Driver", "PostgreSQL Unicode"}, {"Servername", "127.0.0.1"}, {"Port", port},
                                  {"Database", "postgres"}, {"Username", "postgres"}});
     }
@@ -87,13 +91,63 @@ private slots:
         QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
         QCOMPARE(c.dbmsName(), QString("PostgreSQL"));
         QVERIFY(!c.isSqlite());
-        // Read only: the system never writes to the ERP.
-        auto rs = c.query("CREATE TABLE tagora_probe (a int)", &e);
-        QVERIFY(!rs);
-        QVERIFY(!e.isEmpty());
         // Literals pass unchanged to a server that knows them.
-        rs = c.query("SELECT count(*) FROM PART WHERE PARTDES <> N'x'", &e);
+        auto rs = c.query("SELECT count(*) FROM PART WHERE PARTDES <> N'x'", &e);
         QVERIFY2(rs && rs->next(), qPrintable(e));
+    }
+
+    // Every write form is refused and the ERP's rows stay.
+    void writesRefused_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::newRow("create table") << "CREATE TABLE tagora_probe (a int)";
+        QTest::newRow("delete in a common table") << "WITH d AS (DELETE FROM PART RETURNING 1) SELECT count(*) FROM d";
+        QTest::newRow("delete after a common table") << "WITH x AS (SELECT 1) DELETE FROM PART";
+        QTest::newRow("second statement") << "SELECT 1; UPDATE PART SET PARTDES = 'x'";
+        QTest::newRow("select into") << "SELECT * INTO tagora_copy FROM PART";
+        QTest::newRow("row locks") << "SELECT PARTNAME FROM PART FOR UPDATE";
+    }
+    void writesRefused()
+    {
+        QFETCH(QString, sql);
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
+        const QString rows = "SELECT count(*), count(DISTINCT PARTDES) FROM PART";
+        auto rs = c.query(rows, &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        const QVariantList before{rs->value(0), rs->value(1)};
+        rs.reset();
+        QVERIFY(!c.query(sql, &e));
+        rs = c.query(rows, &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QCOMPARE((QVariantList{rs->value(0), rs->value(1)}), before);
+        rs = c.query("SELECT count(*) FROM information_schema.tables WHERE table_name IN ('tagora_probe', 'tagora_copy')", &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QCOMPARE(rs->value(0).toLongLong(), 0LL);
+    }
+
+    // The session itself is read only: a write the guard cannot see (a
+    // function that changes a sequence) is refused by the server.
+    void sessionReadOnly()
+    {
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
+        auto rs = c.query("SELECT current_setting('transaction_read_only')", &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QCOMPARE(rs->value(0).toString(), QString("on"));
+        rs = c.query("SELECT nextval('tagora_probe_seq')", &e);
+        QVERIFY(!rs || !rs->next());
+        QVERIFY2(e.contains("read-only") || (rs && rs->error().contains("read-only")), qPrintable(e));
+    }
+
+    // A driver that reads braces keeps getting them: such a password connects.
+    void bracedValuesConnect()
+    {
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant("x;y}{ "), "", 2), 10, &e), qPrintable(e));
     }
 
     void sameTablesAsSqlite()
