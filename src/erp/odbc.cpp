@@ -647,7 +647,9 @@ long long ErpConnection::countRows(const QString& sql, QString* error)
     QString e;
     QString reason;
     const QString statement = readOnlyStatement(sql, &reason);
-    auto rs = query(QStringLiteral("SELECT COUNT(*) FROM (%1) TagoraCount").arg(withoutOrderBy(statement.isEmpty() ? sql : statement)), &e);
+    // A closing ";" or a comment would end the derived table early.
+    const QString inner = withoutOrderBy(statement.isEmpty() ? sql : statement);
+    auto rs = query(QStringLiteral("SELECT COUNT(*) FROM (%1) TagoraCount").arg(inner), &e);
     if (!rs || !rs->next()) {
         if (error)
             *error = rs ? rs->error() : e;

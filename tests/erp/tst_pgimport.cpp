@@ -150,6 +150,32 @@ private slots:
         QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant("x;y}{ "), "", 2), 10, &e), qPrintable(e));
     }
 
+    // A table locked by another session: the reader's count and its query
+    // share the reader's time-out, and the reader ends with the server's message.
+    void lockedTableEndsWithMessage()
+    {
+        QProcess holder;
+        holder.start(QStandardPaths::findExecutable("psql"),
+                     {"-h", "127.0.0.1", "-p", port, "-U", "postgres", "-d", "postgres", "-q", "-t", "-A"});
+        QVERIFY(holder.waitForStarted());
+        holder.write("BEGIN; LOCK TABLE PART IN ACCESS EXCLUSIVE MODE; SELECT 'held';\n");
+        while (!holder.readAllStandardOutput().contains("held"))
+            QVERIFY(holder.waitForReadyRead(30000));
+
+        const QString items = work.filePath("locked.tdb");
+        DbError de;
+        QVERIFY2(!CreateItemsDB(items, &de).isEmpty(), qPrintable(de.message));
+        ErpReadContext ctx{BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), nullptr, QString(), today};
+        ctx.timeout = 1;
+        ReadError e;
+        const bool ok = ReadItemPriority(ctx, items, {}, {}, false, 1, 1, false, true, &e);
+        holder.write("ROLLBACK;\n");
+        holder.closeWriteChannel();
+        QVERIFY(holder.waitForFinished(30000));
+        QVERIFY(!ok);
+        QVERIFY2(e.message.contains("statement timeout") || e.message.contains("cancel"), qPrintable(e.message));
+    }
+
     void sameTablesAsSqlite()
     {
         const QStringList fromPg = importAll("TagoraPg", "pg");
