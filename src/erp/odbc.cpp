@@ -7,7 +7,6 @@
 #include <QSet>
 
 #include <algorithm>
-#include <cmath>
 
 #include <odbcinst.h>
 #include <sql.h>
