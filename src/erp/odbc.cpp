@@ -2,16 +2,18 @@
 
 #include <QDate>
 #include <QDateTime>
+#include <QFile>
 #include <QFileInfo>
 #include <QRegularExpression>
 #include <QSet>
 
 #include <algorithm>
 
-#include <odbcinst.h>
+#include <pwd.h>
 #include <sql.h>
 #include <sqlext.h>
 #include <sqlucode.h>
+#include <unistd.h>
 
 namespace tagora {
 
@@ -269,19 +271,64 @@ QString pairValue(const QList<ConnPair>& pairs, const char* key)
     return QString();
 }
 
-QString profileString(const QString& section, const char* key, const char* file)
+// unixODBC keeps what it once read of its files for the life of the process
+// (a data source added or changed since is not seen), so the files are read
+// here afresh, where unixODBC looks for them.
+QString iniValue(const QString& file, const QString& section, const QString& key)
 {
-    char buf[1024] = {};
-    const QByteArray s = section.toUtf8();
-    const int len = SQLGetPrivateProfileString(s.constData(), key, "", buf, int(sizeof(buf)) - 1, file);
-    return len > 0 ? QString::fromUtf8(buf, std::min<int>(len, int(sizeof(buf)) - 1)).trimmed() : QString();
+    QFile f(file);
+    if (section.isEmpty() || !f.open(QIODevice::ReadOnly | QIODevice::Text))
+        return QString();
+    bool inSection = false;
+    while (!f.atEnd()) {
+        const QString line = QString::fromUtf8(f.readLine()).trimmed();
+        if (line.startsWith(QLatin1Char('['))) {
+            const int close = int(line.indexOf(QLatin1Char(']')));
+            inSection = close > 0 && line.mid(1, close - 1).trimmed().compare(section, Qt::CaseInsensitive) == 0;
+            continue;
+        }
+        if (!inSection || line.startsWith(QLatin1Char(';')) || line.startsWith(QLatin1Char('#')))
+            continue;
+        const int eq = int(line.indexOf(QLatin1Char('=')));
+        if (eq > 0 && line.left(eq).trimmed().compare(key, Qt::CaseInsensitive) == 0)
+            return line.mid(eq + 1).trimmed();
+    }
+    return QString();
+}
+
+QString systemIniFolder()
+{
+    const QString dir = qEnvironmentVariable("ODBCSYSINI");
+    return dir.isEmpty() ? QStringLiteral("/etc") : dir;
+}
+
+// A data source's entry: the user's file first, as the driver manager reads them.
+QString dsnValue(const QString& dsn, const QString& key)
+{
+    QString user = qEnvironmentVariable("ODBCINI");
+    if (user.isEmpty()) {
+        // unixODBC takes the home folder from the passwd entry, not $HOME.
+        const passwd* pw = getpwuid(getuid());
+        user = QString::fromLocal8Bit(pw ? pw->pw_dir : "") + QStringLiteral("/.odbc.ini");
+    }
+    const QString v = iniValue(user, dsn, key);
+    return v.isEmpty() ? iniValue(systemIniFolder() + QStringLiteral("/odbc.ini"), dsn, key) : v;
+}
+
+QString driverValue(const QString& driver, const QString& key)
+{
+    QString name = qEnvironmentVariable("ODBCINSTINI");
+    if (name.isEmpty())
+        name = QStringLiteral("odbcinst.ini");
+    return iniValue(systemIniFolder() + QLatin1Char('/') + name, driver, key);
 }
 
 // What the driver manager will load for a connection text, found before
 // connecting: the text's own DRIVER, or the data source's Driver entry (a
 // name in odbcinst.ini or a library path).
+enum class DriverKind { Sqlite, Other, Unknown };
 struct DriverTarget {
-    bool sqlite = false;
+    DriverKind kind = DriverKind::Unknown;
     QString database; // the SQLite file the driver will open
 };
 
@@ -293,18 +340,21 @@ DriverTarget driverTarget(const QList<ConnPair>& pairs)
     if (driver.isEmpty()) {
         if (dsn.isEmpty())
             dsn = QStringLiteral("Default");
-        driver = profileString(dsn, "Driver", "odbc.ini");
+        driver = dsnValue(dsn, QStringLiteral("Driver"));
     }
-    QString library = profileString(driver, "Driver", "odbcinst.ini");
+    if (driver.isEmpty())
+        return t;
+    QString library = driverValue(driver, QStringLiteral("Driver"));
     if (library.isEmpty())
         library = driver;
-    t.sqlite = driver.contains(QLatin1String("sqlite"), Qt::CaseInsensitive)
+    const bool sqlite = driver.contains(QLatin1String("sqlite"), Qt::CaseInsensitive)
         || QFileInfo(library).fileName().contains(QLatin1String("sqlite"), Qt::CaseInsensitive);
-    if (t.sqlite) {
+    t.kind = sqlite ? DriverKind::Sqlite : DriverKind::Other;
+    if (sqlite) {
         // The driver takes the first Database it finds in the text, else the data source's.
         t.database = pairValue(pairs, "Database");
         if (t.database.isEmpty() && !dsn.isEmpty())
-            t.database = profileString(dsn, "Database", "odbc.ini");
+            t.database = dsnValue(dsn, QStringLiteral("Database"));
     }
     return t;
 }
@@ -323,7 +373,8 @@ QString connKeyName(const QString& key)
 
 // The SQLite ODBC driver splits the text at every ";" and reads braces as
 // part of the value, so a value that needs braces would be cut into keys of
-// its own (LoadExt, Database). Such a value is refused before connecting.
+// its own (LoadExt, Database). Such a value is refused before connecting, for
+// that driver and for one that cannot be told.
 QString unsafeForSqlite(const QList<ConnPair>& pairs)
 {
     for (const ConnPair& p : pairs) {
@@ -331,8 +382,8 @@ QString unsafeForSqlite(const QList<ConnPair>& pairs)
         const bool blankEnds = !v.isEmpty() && (v.front().isSpace() || v.back().isSpace());
         const bool special = v.contains(QLatin1Char(';')) || v.contains(QLatin1Char('{')) || v.contains(QLatin1Char('}'));
         if (special || blankEnds || (p.braced && p.key.compare(QLatin1String("DRIVER"), Qt::CaseInsensitive) != 0))
-            return QStringLiteral("%1 מכיל תו שמנהל ההתקן של SQLite אינו יכול לקבל בבטחה (; { } או רווח בתחילה או "
-                                  "בסוף), ולכן לא נוצר חיבור ל-ERP. יש לתקן את הערך בהגדרות החיבור.")
+            return QStringLiteral("%1 מכיל תו שמנהל ההתקן של מקור הנתונים אינו יכול לקבל בבטחה (; { } או רווח בתחילה "
+                                  "או בסוף), ולכן לא נוצר חיבור ל-ERP. יש לתקן את הערך בהגדרות החיבור.")
                 .arg(connKeyName(p.key));
     }
     return QString();
@@ -387,10 +438,12 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
     QString connText = connectionText;
     const QList<ConnPair> pairs = connPairs(connectionText);
     const DriverTarget target = driverTarget(pairs);
-    if (target.sqlite) {
+    if (target.kind != DriverKind::Other) {
         const QString unsafe = unsafeForSqlite(pairs);
         if (!unsafe.isEmpty())
             return refuse(unsafe);
+    }
+    if (target.kind == DriverKind::Sqlite) {
         // The driver would create an empty file and report nothing; the ERP
         // that is not there is reported as such.
         if (!target.database.isEmpty() && !QFileInfo::exists(target.database))

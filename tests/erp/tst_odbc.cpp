@@ -181,6 +181,23 @@ private slots:
         QCOMPARE(parts(partsPath), before);
     }
 
+    // A data source added while the program runs is judged by its own driver,
+    // not by what was read of the ODBC files before.
+    void addedDataSourceJudgedByItsDriver()
+    {
+        const QString trace = odbc.dir.filePath("trace.txt");
+        QFile::remove(trace);
+        qputenv("TAGORA_TRACE_FILE", trace.toUtf8());
+        odbc.addDsn(QStringLiteral("TagoraLate"), {{QStringLiteral("Driver"), QStringLiteral("SQLite3")},
+                                                   {QStringLiteral("Database"), erpPath}});
+        ErpConnection erp;
+        QString error;
+        const QString pwd = QStringLiteral("x;LoadExt=") + QStringLiteral(TAGORA_TRACE_EXT);
+        QVERIFY(!erp.open(BuildConnString("TagoraLate", "sa", pwd, "", 2), 10, &error));
+        QVERIFY2(error.startsWith(QStringLiteral("הסיסמה")), qPrintable(error));
+        QVERIFY(!QFileInfo::exists(trace));
+    }
+
     // The witness works: a text that names the library as a key of its own
     // (as a host may write it) does load it.
     void traceLibraryLoads()
