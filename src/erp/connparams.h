@@ -37,7 +37,9 @@ ErpDialect& erpDialect();
 // "DSN=" + name + ";Uid=" + user + ";pwd=" + password for types 1 and 2 (and
 // sets the dialect and the conversions' connection type); empty text for any
 // other type, changing nothing. A value holding ";" or braces is quoted in
-// braces as ODBC requires, so such a password still connects.
+// braces as ODBC requires, so such a password still connects to a driver that
+// reads braces; the SQLite driver reads none, and ErpConnection::open refuses
+// such a value for it.
 QString BuildConnString(const QString& server, const QString& uid, const QVariant& pwd, const QString& database,
                         short type);
 // The connection text of the current values.

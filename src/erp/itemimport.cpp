@@ -31,7 +31,7 @@ public:
               int progressEvery = 5)
         : m_ctx(ctx)
         , m_title(titlePrefix)
-        , m_timeout(timeout)
+        , m_timeout(ctx.timeout > 0 ? ctx.timeout : timeout)
         , m_every(progressEvery)
     {
         report(0);

@@ -19,6 +19,8 @@ struct ErpReadContext {
     // reader runs by documents.
     QString itemByDocCriteria;
     QDate today = QDate::currentDate();
+    // Seconds each reader's ERP operation may take; 0 keeps the reader's own.
+    int timeout = 0;
 };
 
 // A reader's failure: the title names the row being read when it failed.

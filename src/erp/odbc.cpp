@@ -2,13 +2,18 @@
 
 #include <QDate>
 #include <QDateTime>
+#include <QFile>
+#include <QFileInfo>
 #include <QRegularExpression>
+#include <QSet>
 
 #include <algorithm>
 
+#include <pwd.h>
 #include <sql.h>
 #include <sqlext.h>
 #include <sqlucode.h>
+#include <unistd.h>
 
 namespace tagora {
 
@@ -76,6 +81,313 @@ QString withoutOrderBy(const QString& sql)
     }
     return last >= 0 ? sql.left(last) : sql;
 }
+
+// ------------------------------------------------------------ the query guard
+
+// Words that start or carry a write, a change of schema or session, or a call
+// into the server, in any of the servers the ERP may sit on. A read never needs
+// them outside a literal or a quoted name; SQL Server runs a batch without ";",
+// so they are refused wherever they stand, not only at the start.
+const QSet<QString>& writeWords()
+{
+    static const QSet<QString> words = {
+        QStringLiteral("INSERT"),   QStringLiteral("UPDATE"),     QStringLiteral("DELETE"),
+        QStringLiteral("MERGE"),    QStringLiteral("UPSERT"),     QStringLiteral("INTO"),
+        QStringLiteral("CREATE"),   QStringLiteral("DROP"),       QStringLiteral("ALTER"),
+        QStringLiteral("TRUNCATE"), QStringLiteral("RENAME"),     QStringLiteral("GRANT"),
+        QStringLiteral("REVOKE"),   QStringLiteral("DENY"),       QStringLiteral("ATTACH"),
+        QStringLiteral("DETACH"),   QStringLiteral("PRAGMA"),     QStringLiteral("VACUUM"),
+        QStringLiteral("REINDEX"),  QStringLiteral("ANALYZE"),    QStringLiteral("COPY"),
+        QStringLiteral("CALL"),     QStringLiteral("EXEC"),       QStringLiteral("EXECUTE"),
+        QStringLiteral("DECLARE"),  QStringLiteral("SET"),        QStringLiteral("LOCK"),
+        QStringLiteral("BEGIN"),    QStringLiteral("COMMIT"),     QStringLiteral("ROLLBACK"),
+        QStringLiteral("SAVEPOINT"), QStringLiteral("RELEASE"),   QStringLiteral("PREPARE"),
+        QStringLiteral("DEALLOCATE"), QStringLiteral("NOTIFY"),   QStringLiteral("LISTEN"),
+        QStringLiteral("REFRESH"),  QStringLiteral("CLUSTER"),    QStringLiteral("DBCC"),
+        QStringLiteral("BACKUP"),   QStringLiteral("RESTORE"),    QStringLiteral("SHUTDOWN"),
+        QStringLiteral("KILL"),
+    };
+    return words;
+}
+
+bool isWordChar(QChar c)
+{
+    return c.isLetterOrNumber() || c == QLatin1Char('_') || c == QLatin1Char('$');
+}
+
+// The one statement of a text that only reads, without a closing ";" and
+// what follows it, and with each comment made a blank (the SQLite driver
+// splits statements at a ";" even inside a comment); empty with the reason
+// when the text is anything else.
+// Literals, quoted names and comments are skipped as the servers read them;
+// where the servers read a form differently (a backslash in a literal, a
+// comment opened inside a comment, a dollar-quoted string) the text is refused
+// rather than guessed at.
+QString readOnlyStatement(const QString& sql, QString* reason)
+{
+    auto refuse = [&](const QString& why) {
+        *reason = why;
+        return QString();
+    };
+    QString first;
+    QString out;
+    int end = -1;
+    int copied = 0; // sql up to here is in out
+    auto blankOut = [&](int from, int to) {
+        if (end >= 0)
+            return; // past the statement: dropped with the rest
+        out += QStringView(sql).mid(copied, from - copied);
+        out += QLatin1Char(' ');
+        copied = to;
+    };
+    const int n = int(sql.size());
+    for (int i = 0; i < n;) {
+        const QChar c = sql[i];
+        const QChar next = i + 1 < n ? sql[i + 1] : QChar();
+        if (c.isSpace()) {
+            ++i;
+        } else if (c == QLatin1Char('-') && next == QLatin1Char('-')) {
+            const int start = i;
+            while (i < n && sql[i] != QLatin1Char('\n'))
+                ++i;
+            blankOut(start, i);
+        } else if (c == QLatin1Char('/') && next == QLatin1Char('*')) {
+            const int close = int(sql.indexOf(QLatin1String("*/"), i + 2));
+            if (close < 0)
+                return refuse(QStringLiteral("הערה שלא נסגרה"));
+            if (sql.indexOf(QLatin1String("/*"), i + 2) >= 0 && sql.indexOf(QLatin1String("/*"), i + 2) < close)
+                return refuse(QStringLiteral("הערה בתוך הערה"));
+            blankOut(i, close + 2);
+            i = close + 2;
+        } else if (c == QLatin1Char('\'') || c == QLatin1Char('"') || c == QLatin1Char('`') || c == QLatin1Char('[')) {
+            if (end >= 0)
+                return refuse(QStringLiteral("יותר מפקודה אחת"));
+            if (first.isEmpty())
+                return refuse(QStringLiteral("אינה שאילתה"));
+            const QChar closing = c == QLatin1Char('[') ? QLatin1Char(']') : c;
+            int j = i + 1;
+            for (;; ++j) {
+                if (j >= n)
+                    return refuse(QStringLiteral("מחרוזת או שם במירכאות שלא נסגרו"));
+                if (c == QLatin1Char('\'') && sql[j] == QLatin1Char('\\'))
+                    return refuse(QStringLiteral("לוכסן הפוך בתוך מחרוזת"));
+                if (sql[j] == closing) {
+                    if (j + 1 < n && sql[j + 1] == closing) {
+                        ++j; // doubled: part of the text
+                        continue;
+                    }
+                    break;
+                }
+            }
+            i = j + 1;
+        } else if (c == QLatin1Char(';')) {
+            if (end >= 0)
+                return refuse(QStringLiteral("יותר מפקודה אחת"));
+            end = i++;
+        } else if (isWordChar(c)) {
+            if (end >= 0)
+                return refuse(QStringLiteral("יותר מפקודה אחת"));
+            if (c == QLatin1Char('$'))
+                return refuse(QStringLiteral("מחרוזת בסימני דולר"));
+            int j = i;
+            while (j < n && isWordChar(sql[j]))
+                ++j;
+            const QString word = sql.mid(i, j - i).toUpper();
+            if (first.isEmpty())
+                first = word;
+            if (writeWords().contains(word))
+                return refuse(QStringLiteral("המילה %1").arg(word));
+            i = j;
+        } else {
+            if (end >= 0)
+                return refuse(QStringLiteral("יותר מפקודה אחת"));
+            if (first.isEmpty() && c != QLatin1Char('('))
+                return refuse(QStringLiteral("אינה שאילתה"));
+            ++i;
+        }
+    }
+    if (first != QLatin1String("SELECT") && first != QLatin1String("WITH"))
+        return refuse(QStringLiteral("אינה שאילתה"));
+    out += QStringView(sql).mid(copied, (end >= 0 ? end : n) - copied);
+    return out;
+}
+
+// ------------------------------------------------------- the connection text
+
+struct ConnPair {
+    QString key;
+    QString value;
+    bool braced = false;
+};
+
+// The pairs of an ODBC connection text as the standard reads it: a value in
+// braces runs to the closing brace, with "}}" standing for one.
+QList<ConnPair> connPairs(const QString& text)
+{
+    QList<ConnPair> out;
+    const int n = int(text.size());
+    int i = 0;
+    while (i < n) {
+        const int eq = int(text.indexOf(QLatin1Char('='), i));
+        const int semi = int(text.indexOf(QLatin1Char(';'), i));
+        if (eq < 0 || (semi >= 0 && semi < eq)) {
+            i = semi < 0 ? n : semi + 1;
+            continue;
+        }
+        ConnPair p;
+        p.key = text.mid(i, eq - i).trimmed();
+        int j = eq + 1;
+        if (j < n && text[j] == QLatin1Char('{')) {
+            p.braced = true;
+            for (++j; j < n; ++j) {
+                if (text[j] == QLatin1Char('}')) {
+                    if (j + 1 < n && text[j + 1] == QLatin1Char('}')) {
+                        p.value += QLatin1Char('}');
+                        ++j;
+                        continue;
+                    }
+                    ++j;
+                    break;
+                }
+                p.value += text[j];
+            }
+            const int after = int(text.indexOf(QLatin1Char(';'), j));
+            i = after < 0 ? n : after + 1;
+        } else {
+            const int after = int(text.indexOf(QLatin1Char(';'), j));
+            p.value = text.mid(j, (after < 0 ? n : after) - j);
+            i = after < 0 ? n : after + 1;
+        }
+        out << p;
+    }
+    return out;
+}
+
+QString pairValue(const QList<ConnPair>& pairs, const char* key)
+{
+    for (const ConnPair& p : pairs)
+        if (p.key.compare(QLatin1String(key), Qt::CaseInsensitive) == 0)
+            return p.value;
+    return QString();
+}
+
+// unixODBC keeps what it once read of its files for the life of the process
+// (a data source added or changed since is not seen), so the files are read
+// here afresh, where unixODBC looks for them.
+QString iniValue(const QString& file, const QString& section, const QString& key)
+{
+    QFile f(file);
+    if (section.isEmpty() || !f.open(QIODevice::ReadOnly | QIODevice::Text))
+        return QString();
+    bool inSection = false;
+    while (!f.atEnd()) {
+        const QString line = QString::fromUtf8(f.readLine()).trimmed();
+        if (line.startsWith(QLatin1Char('['))) {
+            const int close = int(line.indexOf(QLatin1Char(']')));
+            inSection = close > 0 && line.mid(1, close - 1).trimmed().compare(section, Qt::CaseInsensitive) == 0;
+            continue;
+        }
+        if (!inSection || line.startsWith(QLatin1Char(';')) || line.startsWith(QLatin1Char('#')))
+            continue;
+        const int eq = int(line.indexOf(QLatin1Char('=')));
+        if (eq > 0 && line.left(eq).trimmed().compare(key, Qt::CaseInsensitive) == 0)
+            return line.mid(eq + 1).trimmed();
+    }
+    return QString();
+}
+
+QString systemIniFolder()
+{
+    const QString dir = qEnvironmentVariable("ODBCSYSINI");
+    return dir.isEmpty() ? QStringLiteral("/etc") : dir;
+}
+
+// A data source's entry: the user's file first, as the driver manager reads them.
+QString dsnValue(const QString& dsn, const QString& key)
+{
+    QString user = qEnvironmentVariable("ODBCINI");
+    if (user.isEmpty()) {
+        // unixODBC takes the home folder from the passwd entry, not $HOME.
+        const passwd* pw = getpwuid(getuid());
+        user = QString::fromLocal8Bit(pw ? pw->pw_dir : "") + QStringLiteral("/.odbc.ini");
+    }
+    const QString v = iniValue(user, dsn, key);
+    return v.isEmpty() ? iniValue(systemIniFolder() + QStringLiteral("/odbc.ini"), dsn, key) : v;
+}
+
+QString driverValue(const QString& driver, const QString& key)
+{
+    QString name = qEnvironmentVariable("ODBCINSTINI");
+    if (name.isEmpty())
+        name = QStringLiteral("odbcinst.ini");
+    return iniValue(systemIniFolder() + QLatin1Char('/') + name, driver, key);
+}
+
+// What the driver manager will load for a connection text, found before
+// connecting: the text's own DRIVER, or the data source's Driver entry (a
+// name in odbcinst.ini or a library path).
+enum class DriverKind { Sqlite, Other, Unknown };
+struct DriverTarget {
+    DriverKind kind = DriverKind::Unknown;
+    QString database; // the SQLite file the driver will open
+};
+
+DriverTarget driverTarget(const QList<ConnPair>& pairs)
+{
+    DriverTarget t;
+    QString driver = pairValue(pairs, "DRIVER");
+    QString dsn = pairValue(pairs, "DSN");
+    if (driver.isEmpty()) {
+        if (dsn.isEmpty())
+            dsn = QStringLiteral("Default");
+        driver = dsnValue(dsn, QStringLiteral("Driver"));
+    }
+    if (driver.isEmpty())
+        return t;
+    QString library = driverValue(driver, QStringLiteral("Driver"));
+    if (library.isEmpty())
+        library = driver;
+    const bool sqlite = driver.contains(QLatin1String("sqlite"), Qt::CaseInsensitive)
+        || QFileInfo(library).fileName().contains(QLatin1String("sqlite"), Qt::CaseInsensitive);
+    t.kind = sqlite ? DriverKind::Sqlite : DriverKind::Other;
+    if (sqlite) {
+        // The driver takes the first Database it finds in the text, else the data source's.
+        t.database = pairValue(pairs, "Database");
+        if (t.database.isEmpty() && !dsn.isEmpty())
+            t.database = dsnValue(dsn, QStringLiteral("Database"));
+    }
+    return t;
+}
+
+QString connKeyName(const QString& key)
+{
+    const QString k = key.toLower();
+    if (k == QLatin1String("uid") || k == QLatin1String("user") || k == QLatin1String("username"))
+        return QStringLiteral("שם המשתמש");
+    if (k == QLatin1String("pwd") || k == QLatin1String("password"))
+        return QStringLiteral("הסיסמה");
+    if (k == QLatin1String("dsn"))
+        return QStringLiteral("שם מקור הנתונים");
+    return QStringLiteral("הערך %1").arg(key);
+}
+
+// The SQLite ODBC driver splits the text at every ";" and reads braces as
+// part of the value, so a value that needs braces would be cut into keys of
+// its own (LoadExt, Database). Such a value is refused before connecting, for
+// that driver and for one that cannot be told.
+QString unsafeForSqlite(const QList<ConnPair>& pairs)
+{
+    for (const ConnPair& p : pairs) {
+        const QString& v = p.value;
+        const bool blankEnds = !v.isEmpty() && (v.front().isSpace() || v.back().isSpace());
+        const bool special = v.contains(QLatin1Char(';')) || v.contains(QLatin1Char('{')) || v.contains(QLatin1Char('}'));
+        if (special || blankEnds || (p.braced && p.key.compare(QLatin1String("DRIVER"), Qt::CaseInsensitive) != 0))
+            return QStringLiteral("%1 מכיל תו שמנהל ההתקן של מקור הנתונים אינו יכול לקבל בבטחה (; { } או רווח בתחילה "
+                                  "או בסוף), ולכן לא נוצר חיבור ל-ERP. יש לתקן את הערך בהגדרות החיבור.")
+                .arg(connKeyName(p.key));
+    }
+    return QString();
+}
 } // namespace
 
 QString odbcConnValue(const QString& value)
@@ -109,12 +421,41 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
 {
     close();
     m_timeout = timeoutSeconds;
+    m_deadline = timeoutSeconds > 0 ? QDeadlineTimer(qint64(timeoutSeconds) * 1000) : QDeadlineTimer(QDeadlineTimer::Forever);
     auto fail = [&](SQLSMALLINT type, SQLHANDLE handle) {
         if (error)
             *error = diagnostics(type, handle);
         close();
         return false;
     };
+    auto refuse = [&](const QString& message) {
+        if (error)
+            *error = message;
+        close();
+        return false;
+    };
+
+    QString connText = connectionText;
+    const QList<ConnPair> pairs = connPairs(connectionText);
+    const DriverTarget target = driverTarget(pairs);
+    if (target.kind != DriverKind::Other) {
+        const QString unsafe = unsafeForSqlite(pairs);
+        if (!unsafe.isEmpty())
+            return refuse(unsafe);
+    }
+    if (target.kind == DriverKind::Sqlite) {
+        // The driver would create an empty file and report nothing; the ERP
+        // that is not there is reported as such.
+        if (!target.database.isEmpty() && !QFileInfo::exists(target.database))
+            return refuse(QStringLiteral("קובץ מסד הנתונים של ה-ERP לא נמצא: %1").arg(target.database));
+        // The driver's own busy wait (100 s unless told) outlasts the
+        // operation's time-out on a locked file; it takes the first key it
+        // finds, so these go in front of whatever the text holds.
+        QString keys = QStringLiteral("NoCreat=1;");
+        if (timeoutSeconds > 0)
+            keys += QStringLiteral("Timeout=%1;").arg(qint64(timeoutSeconds) * 1000);
+        connText = keys + connText;
+    }
     if (!SQL_SUCCEEDED(SQLAllocHandle(SQL_HANDLE_ENV, SQL_NULL_HANDLE, &m_h->env)))
         return fail(SQL_HANDLE_ENV, m_h->env);
     SQLSetEnvAttr(m_h->env, SQL_ATTR_ODBC_VERSION, reinterpret_cast<SQLPOINTER>(SQL_OV_ODBC3), 0);
@@ -125,7 +466,7 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
     SQLSetConnectAttr(m_h->dbc, SQL_ATTR_CONNECTION_TIMEOUT, seconds, 0);
     SQLSetConnectAttr(m_h->dbc, SQL_ATTR_ACCESS_MODE, reinterpret_cast<SQLPOINTER>(SQL_MODE_READ_ONLY), 0);
 
-    std::u16string text = wide(connectionText);
+    std::u16string text = wide(connText);
     SQLWCHAR out[1024];
     SQLSMALLINT outLen = 0;
     const SQLRETURN rc = SQLDriverConnectW(m_h->dbc, nullptr, wptr(text), SQLSMALLINT(text.size()), out, 1023, &outLen,
@@ -140,7 +481,56 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
     SQLSMALLINT nameLen = 0;
     if (SQL_SUCCEEDED(SQLGetInfoW(m_h->dbc, SQL_DBMS_NAME, name, sizeof(name) - sizeof(SQLWCHAR), &nameLen)))
         m_dbms = fromWide(name, nameLen / qsizetype(sizeof(SQLWCHAR)));
+
+    // Neither driver honours the read-only mode, so the server itself is told
+    // to refuse writes; a session that cannot be made so is not used.
+    QString message;
+    if (isSqlite()) {
+        // Reading the schema also meets a locked or damaged file now, with
+        // the driver's message, rather than at the first query.
+        if (!execute(QStringLiteral("PRAGMA query_only = ON"), &message)
+            || !execute(QStringLiteral("SELECT count(*) FROM sqlite_master"), &message))
+            return refuse(message);
+    } else if (m_dbms.startsWith(QLatin1String("PostgreSQL"), Qt::CaseInsensitive)) {
+        if (!execute(QStringLiteral("SET SESSION CHARACTERISTICS AS TRANSACTION READ ONLY"), &message))
+            return refuse(message);
+    }
     return true;
+}
+
+int ErpConnection::remainingSeconds() const
+{
+    if (m_timeout <= 0)
+        return 0;
+    // At least a second: 0 would mean no limit at all.
+    return int(std::max<qint64>(1, (m_deadline.remainingTime() + 999) / 1000));
+}
+
+void* ErpConnection::newStatement(QString* error)
+{
+    SQLHSTMT stmt = SQL_NULL_HSTMT;
+    if (!SQL_SUCCEEDED(SQLAllocHandle(SQL_HANDLE_STMT, m_h->dbc, &stmt))) {
+        if (error)
+            *error = diagnostics(SQL_HANDLE_DBC, m_h->dbc);
+        return nullptr;
+    }
+    SQLSetStmtAttr(stmt, SQL_ATTR_QUERY_TIMEOUT, reinterpret_cast<SQLPOINTER>(static_cast<SQLULEN>(remainingSeconds())),
+                   0);
+    return stmt;
+}
+
+bool ErpConnection::execute(const QString& sql, QString* error)
+{
+    auto* stmt = static_cast<SQLHSTMT>(newStatement(error));
+    if (!stmt)
+        return false;
+    std::u16string text = wide(sql);
+    const SQLRETURN rc = SQLExecDirectW(stmt, wptr(text), SQLINTEGER(text.size()));
+    const bool ok = SQL_SUCCEEDED(rc) || rc == SQL_NO_DATA;
+    if (!ok && error)
+        *error = diagnostics(SQL_HANDLE_STMT, stmt);
+    SQLFreeHandle(SQL_HANDLE_STMT, stmt);
+    return ok;
 }
 
 void ErpConnection::close()
@@ -366,30 +756,33 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, const Erp
             *error = QStringLiteral("not connected");
         return nullptr;
     }
-    // Not every driver honours the read-only mode, so the guarantee that
-    // nothing is ever written to the ERP is kept here: only queries go out.
-    static const QRegularExpression queryStart(QStringLiteral("^\\s*\\(*\\s*(SELECT|WITH)\\b"),
-                                               QRegularExpression::CaseInsensitiveOption);
-    if (!queryStart.match(sql).hasMatch()) {
+    // The server is told to refuse writes, and the guard here keeps that
+    // promise on a server that was not: one statement that only reads.
+    QString reason;
+    const QString statement = readOnlyStatement(sql, &reason);
+    if (statement.isEmpty()) {
         if (error)
-            *error = QStringLiteral("only queries are sent to the ERP database: %1").arg(sql.left(60));
+            *error = QStringLiteral("למסד הנתונים של ה-ERP נשלחות רק שאילתות קריאה (%1): %2").arg(reason, sql.left(60));
         return nullptr;
     }
-    SQLHSTMT stmt = SQL_NULL_HSTMT;
-    if (!SQL_SUCCEEDED(SQLAllocHandle(SQL_HANDLE_STMT, m_h->dbc, &stmt))) {
-        if (error)
-            *error = diagnostics(SQL_HANDLE_DBC, m_h->dbc);
-        return nullptr;
+    // The operation's time-out is one budget: each statement waits only for
+    // what the ones before it left, a locked SQLite file included.
+    if (isSqlite() && m_timeout > 0) {
+        const qint64 ms = std::max<qint64>(1, m_deadline.remainingTime());
+        if (!execute(QStringLiteral("PRAGMA busy_timeout = %1").arg(ms), error))
+            return nullptr;
     }
+    auto* stmt = static_cast<SQLHSTMT>(newStatement(error));
+    if (!stmt)
+        return nullptr;
     SQLSetStmtAttr(stmt, SQL_ATTR_CURSOR_TYPE, reinterpret_cast<SQLPOINTER>(SQL_CURSOR_FORWARD_ONLY), 0);
     SQLSetStmtAttr(stmt, SQL_ATTR_CONCURRENCY, reinterpret_cast<SQLPOINTER>(SQL_CONCUR_READ_ONLY), 0);
-    SQLSetStmtAttr(stmt, SQL_ATTR_QUERY_TIMEOUT, reinterpret_cast<SQLPOINTER>(static_cast<SQLULEN>(m_timeout)), 0);
     std::vector<BoundValue> bound;
     if (!bindParams(stmt, params, isSqlite(), bound, error)) {
         SQLFreeHandle(SQL_HANDLE_STMT, stmt);
         return nullptr;
     }
-    std::u16string text = wide(dialectSql(sql, params));
+    std::u16string text = wide(dialectSql(statement, params));
     const SQLRETURN rc = SQLExecDirectW(stmt, wptr(text), SQLINTEGER(text.size()));
     if (!SQL_SUCCEEDED(rc) && rc != SQL_NO_DATA) {
         if (error)
@@ -413,7 +806,11 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, const Erp
 long long ErpConnection::countRows(const QString& sql, const ErpParams& params, QString* error)
 {
     QString e;
-    auto rs = query(QStringLiteral("SELECT COUNT(*) FROM (%1) TagoraCount").arg(withoutOrderBy(sql)), params, &e);
+    QString reason;
+    const QString statement = readOnlyStatement(sql, &reason);
+    // A closing ";" or a comment would end the derived table early.
+    const QString inner = withoutOrderBy(statement.isEmpty() ? sql : statement);
+    auto rs = query(QStringLiteral("SELECT COUNT(*) FROM (%1) TagoraCount").arg(inner), params, &e);
     if (!rs || !rs->next()) {
         if (error)
             *error = rs ? rs->error() : e;

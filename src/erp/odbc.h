@@ -1,5 +1,6 @@
 #pragma once
 
+#include <QDeadlineTimer>
 #include <QString>
 #include <QStringList>
 #include <QVariant>
@@ -9,9 +10,10 @@
 namespace tagora {
 
 // Read-only access to the ERP's database through ODBC. The system never
-// writes there: connections are opened in read-only mode and only queries
-// are sent. Nothing here shows anything; every failure comes back as the
-// driver's own message.
+// writes there: the server is told to refuse writes on connecting (SQLite:
+// query_only; PostgreSQL: a read-only session), and one statement that only
+// reads is all that is sent. Nothing here shows anything; every failure comes
+// back as the driver's own message, or a Hebrew one for what is refused here.
 class ErpRecordset;
 
 // The values a query's "?" markers stand for, in order: text (sent as wide
@@ -34,8 +36,12 @@ public:
     ErpConnection& operator=(const ErpConnection&) = delete;
 
     // Connects with the connection text as it stands ("DSN=...;Uid=...;pwd=..."
-    // or any ODBC connection text). The time-out bounds the login and each
-    // query, so an unreachable server ends in an error, not a hang.
+    // or any ODBC connection text). The time-out is the whole operation's:
+    // the login and every statement after it share it, a locked SQLite file
+    // included, so an unreachable or locked server ends in the driver's
+    // message, not a hang. For the SQLite driver, which reads no braces, a
+    // value it cannot take safely is refused, and a missing file is reported
+    // rather than created.
     bool open(const QString& connectionText, int timeoutSeconds, QString* error);
     void close();
     bool isOpen() const;
@@ -46,8 +52,9 @@ public:
     // The connection's default database (for a file-based driver, its path).
     QString currentCatalog() const;
 
-    // Opens a forward-only, read-only recordset. Null when the query failed
-    // (the driver's message in error).
+    // Opens a forward-only, read-only recordset for one statement that only
+    // reads (a closing ";" allowed), its "?" markers standing for params.
+    // Null when the query was refused or failed (the message in error).
     std::unique_ptr<ErpRecordset> query(const QString& sql, const ErpParams& params, QString* error);
     std::unique_ptr<ErpRecordset> query(const QString& sql, QString* error) { return query(sql, {}, error); }
     std::unique_ptr<ErpRecordset> query(const ErpQuery& q, QString* error) { return query(q.sql, q.params, error); }
@@ -70,9 +77,16 @@ public:
 private:
     friend class ErpRecordset;
     struct Handles;
+    // Seconds left of the operation's time-out (0: none was set).
+    int remainingSeconds() const;
+    void* newStatement(QString* error);
+    // Runs a statement of our own, past the guard, and drops any result.
+    bool execute(const QString& sql, QString* error);
+
     std::unique_ptr<Handles> m_h;
     QString m_dbms;
     int m_timeout = 0;
+    QDeadlineTimer m_deadline;
 };
 
 class ErpRecordset {

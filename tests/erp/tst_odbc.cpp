@@ -2,8 +2,11 @@
 // SQLite ODBC driver standing in for the ERP's server.
 #include "support/erpfixture.h"
 
+#include "erp/connparams.h"
+#include "erp/itemimport.h"
 #include "erp/odbc.h"
 #include "localdb/database.h"
+#include "localdb/schema.h"
 
 #include <QtTest>
 
@@ -26,6 +29,18 @@ class TestOdbc : public QObject {
     Q_OBJECT
     OdbcSandbox odbc;
     QString erpPath;
+    QString partsPath;
+    QString demoPath;
+
+    // The PART rows as the file holds them, read past the ODBC layer.
+    QString parts(const QString& path)
+    {
+        Database db;
+        if (db.open(path, Database::OpenMode::ReadOnly))
+            return QStringLiteral("unreadable");
+        Statement s = db.prepare(QStringLiteral("SELECT group_concat(PARTNAME, ',') FROM PART"));
+        return s.step() == Statement::Step::Row ? s.value(0).toString() : QString();
+    }
 
 private slots:
     void initTestCase()
@@ -37,6 +52,188 @@ private slots:
         QVERIFY(!db.exec(QStringLiteral("CREATE TABLE TEXTS (ID INTEGER PRIMARY KEY, LONGDES TEXT, SHORTDES VARCHAR(16))")));
         odbc.addDsn(QStringLiteral("TagoraTexts"), {{QStringLiteral("Driver"), QStringLiteral("SQLite3")},
                                                     {QStringLiteral("Database"), erpPath}});
+        partsPath = odbc.dir.filePath(QStringLiteral("parts.sqlite"));
+        {
+            Database parts;
+            QVERIFY(!parts.open(partsPath, Database::OpenMode::Create));
+            QVERIFY(!parts.exec(QStringLiteral("CREATE TABLE PART (PART INTEGER PRIMARY KEY, PARTNAME TEXT);"
+                                               "INSERT INTO PART VALUES (1, 'EL-1'), (2, 'EL-2')")));
+        }
+        odbc.addDsn(QStringLiteral("TagoraParts"), {{QStringLiteral("Driver"), QStringLiteral("SQLite3")},
+                                                    {QStringLiteral("Database"), partsPath}});
+        odbc.addDsn(QStringLiteral("TagoraGone"), {{QStringLiteral("Driver"), QStringLiteral("SQLite3")},
+                                                   {QStringLiteral("Database"), odbc.dir.filePath("gone.sqlite")}});
+        demoPath = odbc.addDemo(QStringLiteral("TagoraDemo"), DemoOptions{});
+    }
+
+    // Only one statement that reads goes out; whatever else the text hides
+    // is refused and the ERP's rows stay as they were.
+    void writesRefused_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::newRow("delete") << "DELETE FROM PART";
+        QTest::newRow("delete after a common table") << "WITH x AS (SELECT 1) DELETE FROM PART";
+        QTest::newRow("update after a common table") << "with x as (select 1) update PART set PARTNAME = 'x'";
+        QTest::newRow("insert after a common table") << "WITH x AS (SELECT 1) INSERT INTO PART SELECT * FROM PART";
+        QTest::newRow("second statement") << "SELECT 1; DELETE FROM PART";
+        QTest::newRow("second statement after a literal ;") << "SELECT ';'; DELETE FROM PART";
+        QTest::newRow("second statement after a comment") << "SELECT 1 /* ; */; DELETE FROM PART --";
+        QTest::newRow("second statement after a quoted name") << "SELECT 1 AS \"a;\"; DELETE FROM PART";
+        QTest::newRow("select into") << "SELECT * INTO PARTCOPY FROM PART";
+        QTest::newRow("pragma") << "PRAGMA query_only = OFF";
+        QTest::newRow("comment before a write") << "/* SELECT */ DELETE FROM PART";
+        QTest::newRow("write in parentheses") << "(DELETE FROM PART)";
+        QTest::newRow("backslash read two ways") << "SELECT 'a\\'; DELETE FROM PART; --'";
+        QTest::newRow("comment inside a comment") << "SELECT 1 /* /* */ ; DELETE FROM PART; /* */";
+        QTest::newRow("unclosed literal") << "SELECT 'a";
+    }
+    void writesRefused()
+    {
+        QFETCH(QString, sql);
+        const QString before = parts(partsPath);
+        ErpConnection erp;
+        QString error;
+        QVERIFY2(erp.open(QStringLiteral("DSN=TagoraParts"), 30, &error), qPrintable(error));
+        QVERIFY(!erp.query(sql, &error));
+        QVERIFY(error.contains(QStringLiteral("שאילתות קריאה")));
+        QCOMPARE(erp.countRows(sql), -1LL);
+        QCOMPARE(parts(partsPath), before);
+    }
+
+    // Keywords and ";" inside literals, quoted names and comments are text,
+    // and a closing ";" ends the one statement.
+    void readsAccepted_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::newRow("closing semicolon") << "SELECT PARTNAME FROM PART ORDER BY PART;  -- done";
+        QTest::newRow("keywords in literals and names")
+            << "SELECT PARTNAME, 'DELETE; INTO' AS \"UPDATE;\", [INSERT] FROM (SELECT PARTNAME, 1 AS [INSERT] FROM PART)";
+        QTest::newRow("common table then select") << "WITH x AS (SELECT PARTNAME FROM PART) SELECT * FROM x";
+        QTest::newRow("comments") << "/* labels; DROP */ SELECT PARTNAME -- DELETE\n FROM PART";
+    }
+    void readsAccepted()
+    {
+        QFETCH(QString, sql);
+        ErpConnection erp;
+        QString error;
+        QVERIFY2(erp.open(QStringLiteral("DSN=TagoraParts"), 30, &error), qPrintable(error));
+        const long long count = erp.countRows(sql, &error);
+        QVERIFY2(count == 2, qPrintable(error));
+        auto rs = erp.query(sql, &error);
+        QVERIFY2(rs, qPrintable(error));
+        int n = 0;
+        while (rs->next())
+            ++n;
+        QVERIFY2(!rs->failed(), qPrintable(rs->error()));
+        QCOMPARE(n, 2);
+    }
+
+    // Past the guard, the connection itself refuses writes.
+    void sqliteSessionReadOnly()
+    {
+        ErpConnection erp;
+        QString error;
+        QVERIFY2(erp.open(QStringLiteral("DSN=TagoraParts"), 30, &error), qPrintable(error));
+        auto rs = erp.query(QStringLiteral("SELECT query_only FROM pragma_query_only"), &error);
+        QVERIFY2(rs && rs->next(), qPrintable(error));
+        QCOMPARE(rs->value(0).toLongLong(), 1LL);
+    }
+
+    // A data source whose file is missing is reported as missing, and the
+    // driver is not left to create an empty ERP in its place.
+    void missingFileReported()
+    {
+        const QString gone = odbc.dir.filePath("gone.sqlite");
+        ErpConnection erp;
+        QString error;
+        QVERIFY(!erp.open(BuildConnString("TagoraGone", "sa", QVariant(), "", 2), 10, &error));
+        QVERIFY2(error.contains(QStringLiteral("לא נמצא")) && error.contains(gone), qPrintable(error));
+        QVERIFY(!QFileInfo::exists(gone));
+    }
+
+    // The SQLite driver reads no braces: a value that would need them is
+    // refused before connecting, so no key hidden in it takes effect.
+    void unsafeValuesRefused_data()
+    {
+        QTest::addColumn<QString>("uid");
+        QTest::addColumn<QString>("pwd");
+        QTest::addColumn<QString>("field");
+        const QString ext = QStringLiteral(TAGORA_TRACE_EXT);
+        QTest::newRow("library in the password") << "sa" << "x;LoadExt=" + ext + ";" << QStringLiteral("הסיסמה");
+        QTest::newRow("other database in the user") << "sa;Database=" + partsPath << "" << QStringLiteral("שם המשתמש");
+        QTest::newRow("brace in the password") << "sa" << "a}b{" << QStringLiteral("הסיסמה");
+        QTest::newRow("blank at the end of the user") << "sa " << "" << QStringLiteral("שם המשתמש");
+    }
+    void unsafeValuesRefused()
+    {
+        QFETCH(QString, uid);
+        QFETCH(QString, pwd);
+        QFETCH(QString, field);
+        const QString trace = odbc.dir.filePath("trace.txt");
+        QFile::remove(trace);
+        qputenv("TAGORA_TRACE_FILE", trace.toUtf8());
+        const QString before = parts(partsPath);
+        ErpConnection erp;
+        QString error;
+        QVERIFY(!erp.open(BuildConnString("TagoraTexts", uid, pwd, "", 2), 10, &error));
+        QVERIFY2(error.startsWith(field), qPrintable(error));
+        QVERIFY(!QFileInfo::exists(trace));
+        QCOMPARE(parts(partsPath), before);
+    }
+
+    // A data source added while the program runs is judged by its own driver,
+    // not by what was read of the ODBC files before.
+    void addedDataSourceJudgedByItsDriver()
+    {
+        const QString trace = odbc.dir.filePath("trace.txt");
+        QFile::remove(trace);
+        qputenv("TAGORA_TRACE_FILE", trace.toUtf8());
+        odbc.addDsn(QStringLiteral("TagoraLate"), {{QStringLiteral("Driver"), QStringLiteral("SQLite3")},
+                                                   {QStringLiteral("Database"), erpPath}});
+        ErpConnection erp;
+        QString error;
+        const QString pwd = QStringLiteral("x;LoadExt=") + QStringLiteral(TAGORA_TRACE_EXT);
+        QVERIFY(!erp.open(BuildConnString("TagoraLate", "sa", pwd, "", 2), 10, &error));
+        QVERIFY2(error.startsWith(QStringLiteral("הסיסמה")), qPrintable(error));
+        QVERIFY(!QFileInfo::exists(trace));
+    }
+
+    // The witness works: a text that names the library as a key of its own
+    // (as a host may write it) does load it.
+    void traceLibraryLoads()
+    {
+        const QString trace = odbc.dir.filePath("trace.txt");
+        QFile::remove(trace);
+        qputenv("TAGORA_TRACE_FILE", trace.toUtf8());
+        ErpConnection erp;
+        QString error;
+        erp.open(QStringLiteral("DSN=TagoraTexts;LoadExt=") + QStringLiteral(TAGORA_TRACE_EXT), 10, &error);
+        QVERIFY(QFileInfo::exists(trace));
+    }
+
+    // A file locked by another program: the check and a reader end within
+    // their own time-out with the driver's message.
+    void lockedFileEndsWithMessage()
+    {
+        Database holder;
+        QVERIFY(!holder.open(demoPath));
+        QVERIFY(!holder.exec(QStringLiteral("BEGIN EXCLUSIVE")));
+        QVERIFY(!holder.exec(QStringLiteral("UPDATE PART SET PARTNAME = PARTNAME WHERE 0")));
+
+        ErpConnection erp;
+        QString error;
+        QVERIFY(!erp.open(QStringLiteral("DSN=TagoraDemo"), 1, &error));
+        QVERIFY2(error.contains(QStringLiteral("locked")), qPrintable(error));
+
+        const QString items = odbc.dir.filePath("items.tdb");
+        DbError de;
+        QVERIFY2(!CreateItemsDB(items, &de).isEmpty(), qPrintable(de.message));
+        ErpReadContext ctx{QStringLiteral("DSN=TagoraDemo")};
+        ctx.timeout = 1;
+        ReadError re;
+        QVERIFY(!ReadItemPriority(ctx, items, {}, {}, false, 1, 1, false, false, &re));
+        QVERIFY2(re.message.contains(QStringLiteral("locked")), qPrintable(re.message));
+        QVERIFY(!holder.exec(QStringLiteral("ROLLBACK")));
     }
 
     // The reader takes a long value in pieces of 1,023 characters; joined, they

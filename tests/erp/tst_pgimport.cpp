@@ -103,7 +103,9 @@ private slots:
         QString e;
         // Rows no reader may touch, and the same company where backslashes escape.
         const QString canary = "DROP TABLE IF EXISTS canary; CREATE TABLE canary (n int); INSERT INTO canary VALUES (1), (2), (3);";
-        QVERIFY2(psql({"-d", "postgres", "-f", script, "-c", canary}, &e), qPrintable(e));
+        // The sequence gives a write that only the server's read-only session can refuse.
+        QVERIFY2(psql({"-d", "postgres", "-f", script, "-c", canary, "-c", "CREATE SEQUENCE IF NOT EXISTS tagora_probe_seq"}, &e),
+                 qPrintable(e));
         QVERIFY2(psql({"-d", "postgres", "-c", "DROP DATABASE IF EXISTS backslashes",
                        "-c", "CREATE DATABASE backslashes TEMPLATE postgres",
                        "-c", "ALTER DATABASE backslashes SET standard_conforming_strings = off"}, &e),
@@ -125,13 +127,89 @@ private slots:
         QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
         QCOMPARE(c.dbmsName(), QString("PostgreSQL"));
         QVERIFY(!c.isSqlite());
-        // Read only: the system never writes to the ERP.
-        auto rs = c.query("CREATE TABLE tagora_probe (a int)", &e);
-        QVERIFY(!rs);
-        QVERIFY(!e.isEmpty());
         // Literals pass unchanged to a server that knows them.
-        rs = c.query("SELECT count(*) FROM PART WHERE PARTDES <> N'x'", &e);
+        auto rs = c.query("SELECT count(*) FROM PART WHERE PARTDES <> N'x'", &e);
         QVERIFY2(rs && rs->next(), qPrintable(e));
+    }
+
+    // Every write form is refused and the ERP's rows stay.
+    void writesRefused_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::newRow("create table") << "CREATE TABLE tagora_probe (a int)";
+        QTest::newRow("delete in a common table") << "WITH d AS (DELETE FROM PART RETURNING 1) SELECT count(*) FROM d";
+        QTest::newRow("delete after a common table") << "WITH x AS (SELECT 1) DELETE FROM PART";
+        QTest::newRow("second statement") << "SELECT 1; UPDATE PART SET PARTDES = 'x'";
+        QTest::newRow("select into") << "SELECT * INTO tagora_copy FROM PART";
+        QTest::newRow("row locks") << "SELECT PARTNAME FROM PART FOR UPDATE";
+    }
+    void writesRefused()
+    {
+        QFETCH(QString, sql);
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
+        const QString rows = "SELECT count(*), count(DISTINCT PARTDES) FROM PART";
+        auto rs = c.query(rows, &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        const QVariantList before{rs->value(0), rs->value(1)};
+        rs.reset();
+        QVERIFY(!c.query(sql, &e));
+        rs = c.query(rows, &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QCOMPARE((QVariantList{rs->value(0), rs->value(1)}), before);
+        rs = c.query("SELECT count(*) FROM information_schema.tables WHERE table_name IN ('tagora_probe', 'tagora_copy')", &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QCOMPARE(rs->value(0).toLongLong(), 0LL);
+    }
+
+    // The session itself is read only: a write the guard cannot see (a
+    // function that changes a sequence) is refused by the server.
+    void sessionReadOnly()
+    {
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
+        auto rs = c.query("SELECT current_setting('transaction_read_only')", &e);
+        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QCOMPARE(rs->value(0).toString(), QString("on"));
+        rs = c.query("SELECT nextval('tagora_probe_seq')", &e);
+        QVERIFY(!rs || !rs->next());
+        QVERIFY2(e.contains("read-only") || (rs && rs->error().contains("read-only")), qPrintable(e));
+    }
+
+    // A driver that reads braces keeps getting them: such a password connects.
+    void bracedValuesConnect()
+    {
+        ErpConnection c;
+        QString e;
+        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant("x;y}{ "), "", 2), 10, &e), qPrintable(e));
+    }
+
+    // A table locked by another session: the reader's count and its query
+    // share the reader's time-out, and the reader ends with the server's message.
+    void lockedTableEndsWithMessage()
+    {
+        QProcess holder;
+        holder.start(QStandardPaths::findExecutable("psql"),
+                     {"-h", "127.0.0.1", "-p", port, "-U", "postgres", "-d", "postgres", "-q", "-t", "-A"});
+        QVERIFY(holder.waitForStarted());
+        holder.write("BEGIN; LOCK TABLE PART IN ACCESS EXCLUSIVE MODE; SELECT 'held';\n");
+        while (!holder.readAllStandardOutput().contains("held"))
+            QVERIFY(holder.waitForReadyRead(30000));
+
+        const QString items = work.filePath("locked.tdb");
+        DbError de;
+        QVERIFY2(!CreateItemsDB(items, &de).isEmpty(), qPrintable(de.message));
+        ErpReadContext ctx{BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), nullptr, QString(), today};
+        ctx.timeout = 1;
+        ReadError e;
+        const bool ok = ReadItemPriority(ctx, items, {}, {}, false, 1, 1, false, true, &e);
+        holder.write("ROLLBACK;\n");
+        holder.closeWriteChannel();
+        QVERIFY(holder.waitForFinished(30000));
+        QVERIFY(!ok);
+        QVERIFY2(e.message.contains("statement timeout") || e.message.contains("cancel"), qPrintable(e.message));
     }
 
     void sameTablesAsSqlite()
