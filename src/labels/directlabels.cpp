@@ -307,6 +307,17 @@ QString PrepareJobFolder(const QString& folder)
 #endif
 }
 
+namespace {
+// Only text makes a picture: a number or nothing leaves the cell empty.
+bool makesPicture(const Statement& record, int column)
+{
+    if (column < 0)
+        return false;
+    const QVariant value = record.value(column);
+    return value.metaType().id() == QMetaType::QString && !value.toString().isEmpty();
+}
+} // namespace
+
 QString MakeBarcodeImages(const QString& folder, const QString& column, int fieldIndex, const QString& dbPath,
                           const QString& sql, LabelBarDef& bar, BarcodeLibrary& library,
                           QVector<BarcodeRefusal>* refusals)
@@ -333,10 +344,9 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
     QString failure;
     for (; step == Statement::Step::Row; step = records.step()) {
         ++record;
-        const QVariant value = records.value(col);
-        // Only text makes a picture: a number or nothing leaves the cell empty.
-        if (value.metaType().id() != QMetaType::QString || value.toString().isEmpty())
+        if (!makesPicture(records, col))
             continue;
+        const QVariant value = records.value(col);
         QString data = value.toString();
         if (bar.LeftLen > 0)
             data = data.left(bar.LeftLen);
@@ -570,7 +580,10 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
                         const LabelLineDef& l = layout.lines[size_t(i)];
                         if (!l.UseCell)
                             continue;
-                        if (l.ViewType == 1)
+                        if (l.ViewType == 1 && !makesPicture(records, columns[size_t(i)]))
+                            // Nothing to draw: an empty cell, not a broken picture on paper.
+                            out.line(QStringLiteral("    <tr align='center'><td class='L%1'>&nbsp;</td></tr>").arg(i));
+                        else if (l.ViewType == 1)
                             out.line(QStringLiteral("    <tr align='center'><td class='L%1'><img src='").arg(i)
                                      + BarcodeImageName(l.FldID, int(recordNumber)) + QLatin1Char('\'') + picture
                                      + QStringLiteral("></img></td></tr>"));

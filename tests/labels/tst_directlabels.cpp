@@ -136,9 +136,11 @@ private slots:
         QCOMPARE(html.count("<td class='L0'>"), 7);
         QCOMPARE(html.count("<tr><td nowrap>&nbsp;</td></tr>"), 1);
         QVERIFY(html.lastIndexOf("&nbsp;</td></tr>") > html.lastIndexOf("<td class='L0'>"));
-        // One picture name per record, however many copies.
-        QCOMPARE(html.count("B0400003.BMP"), 4);
+        // One picture name per record, however many copies; a record with no
+        // barcode value (B1) gets empty cells rather than a broken picture.
         QCOMPARE(html.count("B0400001.BMP"), 2);
+        QCOMPARE(html.count("B0400003.BMP"), 0);
+        QCOMPARE(html.count("<td class='L1'>&nbsp;</td>"), 4);
         QCOMPARE(html.count("\r\n"), html.count('\n'));
         QVERIFY(html.endsWith("</BODY>\r\n</HTML>\r\n"));
     }
