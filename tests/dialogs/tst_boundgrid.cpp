@@ -182,11 +182,7 @@ private slots:
         BoundTableModel m;
         makeModel(m);
         QVERIFY(m.setQuery("SELECT A, B, Mark, Copies, Kind, Name FROM t ORDER BY A, B"));
-        {
-            Database d;
-            QVERIFY(!d.open(db));
-            QVERIFY(!d.exec("CREATE TRIGGER no_marks BEFORE UPDATE OF Mark ON t BEGIN SELECT RAISE(ABORT, 'marks are frozen'); END"));
-        }
+        QVERIFY(!execOn(db, "CREATE TRIGGER no_marks BEFORE UPDATE OF Mark ON t BEGIN SELECT RAISE(ABORT, 'marks are frozen'); END"));
         QSignalSpy failed(&m, &BoundTableModel::writeFailed);
         QVERIFY(!m.setField({0, 2}, "Mark", 1));
         QCOMPARE(failed.count(), 1);

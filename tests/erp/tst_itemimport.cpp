@@ -162,11 +162,7 @@ private slots:
         ReadError e;
         QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, false, 1, 1, false, false, &e));
         const int first = scalar(db, "SELECT count(*) FROM tItems").toInt();
-        {
-            Database d;
-            QVERIFY(!d.open(db));
-            QVERIFY(!d.exec("UPDATE tItems SET PrintLabel = TRUE, Copies = 9, Price = -1 WHERE ItemKey = 'AB''12'"));
-        }
+        QVERIFY(!execOn(db, "UPDATE tItems SET PrintLabel = TRUE, Copies = 9, Price = -1 WHERE ItemKey = 'AB''12'"));
         QVERIFY(ReadItemPriority(ctx(2), db, {}, {}, false, 1, 1, false, false, &e));
         QCOMPARE(scalar(db, "SELECT count(*) FROM tItems").toInt(), first);
         QCOMPARE(rows(db, "SELECT PrintLabel, Copies, Price > 0 FROM tItems WHERE ItemKey = 'AB''12'"), QStringList{"1|1|1"});
@@ -302,11 +298,7 @@ private slots:
         const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
         QVERIFY(!PrepareDataFolder(data));
         const QString items = data + "/" + dbfiles::Items;
-        {
-            Database d;
-            QVERIFY(!d.open(items));
-            QVERIFY(!d.exec("INSERT INTO tItems (ItemKey, PrintLabel, Copies) VALUES ('KEPT', TRUE, 4)"));
-        }
+        QVERIFY(!execOn(items, "INSERT INTO tItems (ItemKey, PrintLabel, Copies) VALUES ('KEPT', TRUE, 4)"));
         CardFixture f(QStringLiteral("[Params]\nConnServer=NoSuchSource\nConnType=1\n[GeneralParams]\nDBPath=%1\n")
                           .arg(data)
                           .toUtf8());
@@ -391,13 +383,9 @@ private slots:
         const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
         QVERIFY(!PrepareDataFolder(data));
         const QString items = data + "/" + dbfiles::Items;
-        {
-            Database d;
-            QVERIFY(!d.open(items));
-            QVERIFY(!d.exec("INSERT INTO tAccountDef (AccountKey, LabelName) VALUES ('C1', 'x.lbl');"
-                            "INSERT INTO tItems (ItemKey) VALUES ('GONE-FROM-ERP');"
-                            "INSERT INTO tAlterKeys (AccountKey, ItemKey, AlterNum) VALUES ('GONE', 'GONE-FROM-ERP', 'X')"));
-        }
+        QVERIFY(!execOn(items, "INSERT INTO tAccountDef (AccountKey, LabelName) VALUES ('C1', 'x.lbl');"
+                        "INSERT INTO tItems (ItemKey) VALUES ('GONE-FROM-ERP');"
+                        "INSERT INTO tAlterKeys (AccountKey, ItemKey, AlterNum) VALUES ('GONE', 'GONE-FROM-ERP', 'X')"));
         const QByteArray ini = QStringLiteral("[Params]\nConnServer=%1\nConnType=1\n[GeneralParams]\nDBPath=%2\n"
                                               "[ImportItems]\nPriceField=1\nImportAlterKeys=1\nReadPriceList=1\n")
                                    .arg(kDsn2, data).toUtf8();

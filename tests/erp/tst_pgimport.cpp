@@ -9,7 +9,6 @@
 
 #include "erp/connparams.h"
 #include "erp/itemimport.h"
-#include "erp/odbc.h"
 #include "localdb/database.h"
 #include "localdb/schema.h"
 
@@ -18,7 +17,6 @@
 #include <QtTest>
 
 using namespace tagora;
-
 
 class TestPgImport : public QObject {
     Q_OBJECT
@@ -46,12 +44,9 @@ class TestPgImport : public QObject {
     {
         if (dsn == "TagoraLite")
             return scalar(lite, "SELECT count(*) FROM canary").toInt();
-        ErpConnection c;
         QString e;
-        if (!c.open(pgConn(dsn), 10, &e))
-            return -1;
-        auto rs = c.query("SELECT count(*) FROM canary", &e);
-        return rs && rs->next() ? int(rs->value(0).toLongLong()) : -1;
+        const auto c = openErp(pgConn(dsn), &e, 10);
+        return c ? firstValue(*c, "SELECT count(*) FROM canary", &e).toInt() : -1;
     }
 
     // Every reader of the item import into a fresh items database; the tables it leaves.
@@ -62,7 +57,7 @@ class TestPgImport : public QObject {
         DbError de;
         if (CreateItemsDB(items, &de).isEmpty() || CreateTempItemsDB(staging, items, &de).isEmpty())
             return {de.message};
-        const ErpReadContext ctx{BuildConnString(dsn, "postgres", QVariant(), "", 2), nullptr, QString(), today};
+        const ErpReadContext ctx{pgConn(dsn), nullptr, QString(), today};
         ReadError e;
         const bool ok = ReadItemPriority(ctx, items, {}, {}, false, 1, 1, false, true, &e)
             && ReadItemFName(ctx, items, {}, {}, false, &e)
@@ -96,8 +91,7 @@ private slots:
         lite = odbc.addDemo("TagoraLite", o);
         const QString script = work.filePath("demo.sql");
         QFile f(script);
-        QVERIFY(f.open(QIODevice::WriteOnly));
-        f.write(DemoErpScript(o).toUtf8());
+        QVERIFY(f.open(QIODevice::WriteOnly) && f.write(DemoErpScript(o).toUtf8()) > 0);
         f.close();
         QVERIFY2(!QStandardPaths::findExecutable("psql").isEmpty(), "psql is not installed");
         QString e;
@@ -110,26 +104,23 @@ private slots:
                        "-c", "CREATE DATABASE backslashes TEMPLATE postgres",
                        "-c", "ALTER DATABASE backslashes SET standard_conforming_strings = off"}, &e),
                  qPrintable(e));
-        {
-            Database d;
-            QVERIFY(!d.open(lite));
-            QVERIFY(!d.exec(canary));
-        }
+        Database d;
+        QVERIFY(!d.open(lite) && !d.exec(canary));
         for (const auto& [dsn, db] : {std::pair{"TagoraPg", "postgres"}, {"TagoraPgBackslash", "backslashes"}})
             odbc.addDsn(dsn, {{"Driver", "PostgreSQL Unicode"}, {"Servername", "127.0.0.1"}, {"Port", port},
                               {"Database", db}, {"Username", "postgres"}});
     }
 
+    // A driver that reads braces keeps getting them: such a password connects.
     void serverNamesItself()
     {
-        ErpConnection c;
         QString e;
-        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
-        QCOMPARE(c.dbmsName(), QString("PostgreSQL"));
-        QVERIFY(!c.isSqlite());
+        const auto c = openErp(BuildConnString("TagoraPg", "postgres", QVariant("x;y}{ "), "", 2), &e, 10);
+        QVERIFY2(c, qPrintable(e));
+        QCOMPARE(c->dbmsName(), QString("PostgreSQL"));
+        QVERIFY(!c->isSqlite());
         // Literals pass unchanged to a server that knows them.
-        auto rs = c.query("SELECT count(*) FROM PART WHERE PARTDES <> N'x'", &e);
-        QVERIFY2(rs && rs->next(), qPrintable(e));
+        QVERIFY2(firstValue(*c, "SELECT count(*) FROM PART WHERE PARTDES <> N'x'", &e).isValid(), qPrintable(e));
     }
 
     // Every write form is refused and the ERP's rows stay.
@@ -146,44 +137,29 @@ private slots:
     void writesRefused()
     {
         QFETCH(QString, sql);
-        ErpConnection c;
         QString e;
-        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
-        const QString rows = "SELECT count(*), count(DISTINCT PARTDES) FROM PART";
-        auto rs = c.query(rows, &e);
-        QVERIFY2(rs && rs->next(), qPrintable(e));
-        const QVariantList before{rs->value(0), rs->value(1)};
-        rs.reset();
-        QVERIFY(!c.query(sql, &e));
-        rs = c.query(rows, &e);
-        QVERIFY2(rs && rs->next(), qPrintable(e));
-        QCOMPARE((QVariantList{rs->value(0), rs->value(1)}), before);
-        rs = c.query("SELECT count(*) FROM information_schema.tables WHERE table_name IN ('tagora_probe', 'tagora_copy')", &e);
-        QVERIFY2(rs && rs->next(), qPrintable(e));
-        QCOMPARE(rs->value(0).toLongLong(), 0LL);
+        const auto c = openErp(pgConn("TagoraPg"), &e, 10);
+        QVERIFY2(c, qPrintable(e));
+        const QString rows = "SELECT count(*) || '/' || count(DISTINCT PARTDES) FROM PART";
+        const QVariant before = firstValue(*c, rows, &e);
+        QVERIFY2(before.isValid(), qPrintable(e));
+        QVERIFY(!c->query(sql, &e));
+        QCOMPARE(firstValue(*c, rows, &e), before);
+        QCOMPARE(firstValue(*c, "SELECT count(*) FROM information_schema.tables"
+                                " WHERE table_name IN ('tagora_probe', 'tagora_copy')", &e).toLongLong(), 0LL);
     }
 
     // The session itself is read only: a write the guard cannot see (a
     // function that changes a sequence) is refused by the server.
     void sessionReadOnly()
     {
-        ErpConnection c;
         QString e;
-        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), 10, &e), qPrintable(e));
-        auto rs = c.query("SELECT current_setting('transaction_read_only')", &e);
-        QVERIFY2(rs && rs->next(), qPrintable(e));
-        QCOMPARE(rs->value(0).toString(), QString("on"));
-        rs = c.query("SELECT nextval('tagora_probe_seq')", &e);
+        const auto c = openErp(pgConn("TagoraPg"), &e, 10);
+        QVERIFY2(c, qPrintable(e));
+        QCOMPARE(firstValue(*c, "SELECT current_setting('transaction_read_only')", &e).toString(), QString("on"));
+        auto rs = c->query("SELECT nextval('tagora_probe_seq')", &e);
         QVERIFY(!rs || !rs->next());
         QVERIFY2(e.contains("read-only") || (rs && rs->error().contains("read-only")), qPrintable(e));
-    }
-
-    // A driver that reads braces keeps getting them: such a password connects.
-    void bracedValuesConnect()
-    {
-        ErpConnection c;
-        QString e;
-        QVERIFY2(c.open(BuildConnString("TagoraPg", "postgres", QVariant("x;y}{ "), "", 2), 10, &e), qPrintable(e));
     }
 
     // A table locked by another session: the reader's count and its query
@@ -201,7 +177,7 @@ private slots:
         const QString items = work.filePath("locked.tdb");
         DbError de;
         QVERIFY2(!CreateItemsDB(items, &de).isEmpty(), qPrintable(de.message));
-        ErpReadContext ctx{BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), nullptr, QString(), today};
+        ErpReadContext ctx{pgConn("TagoraPg"), nullptr, QString(), today};
         ctx.timeout = 1;
         ReadError e;
         const bool ok = ReadItemPriority(ctx, items, {}, {}, false, 1, 1, false, true, &e);
@@ -239,20 +215,18 @@ private slots:
         QFETCH(QString, dsn);
         QFETCH(QString, column);
         QFETCH(QString, sample);
-        ErpConnection c;
         QString e;
-        QVERIFY2(c.open(pgConn(dsn), 10, &e), qPrintable(e));
-        auto rs = c.query(sample, &e);
-        QVERIFY2(rs && rs->next(), qPrintable(e));
-        const QString value = rs->value(0).toString();
-        QVERIFY(!value.isEmpty());
+        const auto c = openErp(pgConn(dsn), &e, 10);
+        QVERIFY2(c, qPrintable(e));
+        const QString value = firstValue(*c, sample, &e).toString();
+        QVERIFY2(!value.isEmpty(), qPrintable(e));
         const QString find = QStringLiteral("SELECT %1 FROM PART WHERE %1 = ?").arg(column);
-        rs = c.query(find, {value}, &e);
+        auto rs = c->query(find, {value}, &e);
         QVERIFY2(rs, qPrintable(e));
         QVERIFY2(rs->next(), qPrintable(value));
         QCOMPARE(rs->value(0).toString(), value);
         // A backslash before the quote is part of the value, and nothing matches it.
-        rs = c.query(find, {"\\'" + value}, &e);
+        rs = c->query(find, {"\\'" + value}, &e);
         QVERIFY2(rs, qPrintable(e));
         QVERIFY(!rs->next());
         QVERIFY(!rs->failed());
@@ -281,12 +255,10 @@ private slots:
         QFETCH(QString, to);
         if (dsn == "TagoraPgBackslash") {
             // The premise: this server does read backslashes in literals.
-            ErpConnection c;
             QString e;
-            QVERIFY2(c.open(pgConn(dsn), 10, &e), qPrintable(e));
-            auto rs = c.query("SELECT current_setting('standard_conforming_strings')", &e);
-            QVERIFY2(rs && rs->next(), qPrintable(e));
-            QCOMPARE(rs->value(0).toString(), QString("off"));
+            const auto c = openErp(pgConn(dsn), &e, 10);
+            QVERIFY2(c, qPrintable(e));
+            QCOMPARE(firstValue(*c, "SELECT current_setting('standard_conforming_strings')", &e).toString(), QString("off"));
         }
         const QString items = work.filePath(QString("range-%1.tdb").arg(QTest::currentDataTag()).replace(' ', '_'));
         const QString staging = items + ".tmp";
@@ -320,7 +292,7 @@ private slots:
     void priceFieldsFromServer()
     {
         QString e;
-        const auto fields = ReadPriceFields(BuildConnString("TagoraPg", "postgres", QVariant(), "", 2), &e);
+        const auto fields = ReadPriceFields(pgConn("TagoraPg"), &e);
         QVERIFY2(e.isEmpty(), qPrintable(e));
         QVERIFY(fields.size() >= 4);
         for (const PriceField& f : fields)

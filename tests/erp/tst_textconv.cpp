@@ -174,15 +174,14 @@ private slots:
 
     void connString_data()
     {
-        QTest::addColumn<QString>("pwd");
         QTest::addColumn<QVariant>("pwdValue");
         QTest::addColumn<int>("type");
         QTest::addColumn<QString>("expected");
-        QTest::newRow("plain") << "" << QVariant("secret") << 1 << "DSN=erp;Uid=sa;pwd=secret";
-        QTest::newRow("null password") << "" << QVariant() << 2 << "DSN=erp;Uid=sa;pwd=";
-        QTest::newRow("semicolon quoted") << "" << QVariant("a;b") << 2 << "DSN=erp;Uid=sa;pwd={a;b}";
-        QTest::newRow("brace doubled") << "" << QVariant("x}y") << 2 << "DSN=erp;Uid=sa;pwd={x}}y}";
-        QTest::newRow("unknown type") << "" << QVariant("x") << 3 << "";
+        QTest::newRow("plain") << QVariant("secret") << 1 << "DSN=erp;Uid=sa;pwd=secret";
+        QTest::newRow("null password") << QVariant() << 2 << "DSN=erp;Uid=sa;pwd=";
+        QTest::newRow("semicolon quoted") << QVariant("a;b") << 2 << "DSN=erp;Uid=sa;pwd={a;b}";
+        QTest::newRow("brace doubled") << QVariant("x}y") << 2 << "DSN=erp;Uid=sa;pwd={x}}y}";
+        QTest::newRow("unknown type") << QVariant("x") << 3 << "";
     }
     void connString()
     {

@@ -37,11 +37,7 @@ private slots:
         QVERIFY(ReadItemPriority(ctx, data + "/" + dbfiles::Items, {}, {}, false, 1, 1, false, false, &e));
         DbError de;
         QVERIFY(!CreateTempDocsDB(data + "/" + dbfiles::Config, data + "/" + dbfiles::Items, data + "/" + dbfiles::TempDocs, &de).isEmpty());
-        {
-            Database d;
-            QVERIFY(!d.open(data + "/" + dbfiles::Items));
-            QVERIFY(!d.exec("UPDATE tItems SET PrintLabel = 1, Copies = 1"));
-        }
+        QVERIFY(!execOn(data + "/" + dbfiles::Items, "UPDATE tItems SET PrintLabel = 1, Copies = 1"));
         const QStringList expected = rows(data + "/" + dbfiles::Items,
                                           "SELECT 'CODE-128:' || BarCode FROM tItems WHERE BarCode <> '' ORDER BY 1");
         QVERIFY(expected.size() > 10);

@@ -98,6 +98,14 @@ class TestLabelRun : public QObject {
         return o;
     }
 
+    // A control printing from data's folder through a journal of its own, at *journal.
+    std::unique_ptr<CardFixture> journalCard(const LabelData& data, QString* journal, const QString& general = {})
+    {
+        *journal = work.filePath(QStringLiteral("card%1.txt").arg(++runs));
+        return std::make_unique<CardFixture>(
+            QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n%3").arg(*journal, data.folder, general).toUtf8());
+    }
+
 private slots:
     // Two records of one label file: every program's calls, in order.
     void callsPerProgram_data()
@@ -160,10 +168,8 @@ private slots:
     {
         LabelData data;
         const QString path = work.filePath("ids.txt");
-        QFile::remove(path);
         QFile pre(path);
-        QVERIFY(pre.open(QIODevice::WriteOnly));
-        pre.write("an earlier run\nand another\n");
+        QVERIFY(pre.open(QIODevice::WriteOnly) && pre.write("an earlier run\nand another\n") > 0);
         pre.close();
         AutomationRegistry registry;
         registry.setFallback(std::make_shared<JournalProvider>(path));
@@ -302,13 +308,13 @@ private slots:
         QFETCH(bool, roll);
         QFETCH(QStringList, keys);
         LabelData data;
-        const QString journal = work.filePath(QStringLiteral("button%1.txt").arg(++runs));
-        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n").arg(journal, data.folder).toUtf8());
-        f.c<QRadioButton>(roll ? "OptPrinter(1)" : "OptPrinter(0)")->setChecked(true);
-        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
-        f.c<QPushButton>("cmdPrintItmes")->click();
-        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
-        QCOMPARE(f.card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        QString journal;
+        const auto f = journalCard(data, &journal);
+        f->c<QRadioButton>(roll ? "OptPrinter(1)" : "OptPrinter(0)")->setChecked(true);
+        f->c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
+        f->c<QPushButton>("cmdPrintItmes")->click();
+        QCOMPARE(f->prompt->lines(), QStringList());
+        QCOMPARE(f->card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
         QStringList sent;
         for (const QString& l : readJournal(journal).filter("\"ItemKey\""))
             sent << l.section('"', 3, 3);
@@ -319,16 +325,15 @@ private slots:
     void blankExpressionRowIsNotSent()
     {
         LabelData data;
-        const QString journal = work.filePath(QStringLiteral("blank%1.txt").arg(++runs));
-        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\n").arg(journal, data.folder).toUtf8());
-        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
-        f.c<QCheckBox>("ChkFldSend(33)")->setChecked(true);
-        f.c<QLineEdit>("txtFldExpr(33)")->setText(" ");
-        f.c<QCheckBox>("ChkFldSend(34)")->setChecked(true);
-        f.c<QLineEdit>("txtFldExpr(34)")->setText("tItems.Unit");
-        f.c<QPushButton>("cmdPrintItmes")->click();
-        QVERIFY2(f.prompt->lines().isEmpty(), qPrintable(f.prompt->lines().join('\n')));
-        QCOMPARE(f.card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        QString journal;
+        const auto f = journalCard(data, &journal);
+        for (int row : {0, 33, 34})
+            f->c<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->setChecked(true);
+        f->c<QLineEdit>("txtFldExpr(33)")->setText(" ");
+        f->c<QLineEdit>("txtFldExpr(34)")->setText("tItems.Unit");
+        f->c<QPushButton>("cmdPrintItmes")->click();
+        QCOMPARE(f->prompt->lines(), QStringList());
+        QCOMPARE(f->card->message(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
         const QStringList lines = readJournal(journal);
         QVERIFY(lines.filter("\"EX1\"").isEmpty());
         QCOMPARE(lines.filter("\"EX2\", \"pc\"").size(), 3);
@@ -346,27 +351,26 @@ private slots:
     {
         QFETCH(bool, direct);
         LabelData data;
-        const QString journal = work.filePath(QStringLiteral("statements%1.txt").arg(++runs));
         qputenv("Temp", work.filePath(QStringLiteral("temp%1").arg(runs)).toUtf8());
-        CardFixture f(QStringLiteral("[Automation]\nJournalFile=%1\n[GeneralParams]\nDBPath=%2\nOptOLE0=%3\nOptOLE3=%4\n"
-                                     "[LabelDef0]\nUseCell=-1\nFldID=0\n")
-                          .arg(journal, data.folder, direct ? "False" : "True", direct ? "True" : "False")
-                          .toUtf8());
+        QString journal;
+        const auto f = journalCard(data, &journal,
+                                   QStringLiteral("OptOLE0=%1\nOptOLE3=%2\n[LabelDef0]\nUseCell=-1\nFldID=0\n")
+                                       .arg(direct ? "False" : "True", direct ? "True" : "False"));
         const QString expression = QStringLiteral("1) AS EX1 FROM tItems; SELECT (1");
-        f.c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
-        f.c<QCheckBox>("ChkFldSend(33)")->setChecked(true);
-        f.c<QLineEdit>("txtFldExpr(33)")->setText(expression);
-        f.c<QPushButton>("cmdPrintItmes")->click();
+        f->c<QCheckBox>("ChkFldSend(0)")->setChecked(true);
+        f->c<QCheckBox>("ChkFldSend(33)")->setChecked(true);
+        f->c<QLineEdit>("txtFldExpr(33)")->setText(expression);
+        f->c<QPushButton>("cmdPrintItmes")->click();
         directLabelLayout() = DirectLabelLayout{};
         qunsetenv("Temp");
 
         LabelQuerySettings settings;
         settings.sent[33] = true;
         settings.expressions[33] = expression;
-        QCOMPARE(f.prompt->lines(), QStringList{QString::fromUtf8("תקלה: ") + CheckItemQuery(settings)});
-        QVERIFY(f.pages->shown.isEmpty());
+        QCOMPARE(f->prompt->lines(), QStringList{QString::fromUtf8("תקלה: ") + CheckItemQuery(settings)});
+        QVERIFY(f->pages->shown.isEmpty());
         QVERIFY(readJournal(journal).isEmpty());
-        QVERIFY(f.card->message() != QString::fromUtf8("הכנת המדבקות הסתיימה"));
+        QVERIFY(f->card->message() != QString::fromUtf8("הכנת המדבקות הסתיימה"));
     }
 };
 

@@ -40,6 +40,19 @@ class TestSchema : public QObject {
 
     QString path(const QString& name) const { return QDir(folder).filePath(name); }
 
+    // A new file of the kind named: documents, staging, or else items.
+    DbError create(const QString& kind, const QString& target) const
+    {
+        DbError e;
+        if (kind == dbfiles::TempDocs)
+            CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), target, &e);
+        else if (kind == dbfiles::TempItems)
+            CreateTempItemsDB(target, path(dbfiles::Items), &e);
+        else
+            CreateItemsDB(target, &e);
+        return e;
+    }
+
 private slots:
     void initTestCase()
     {
@@ -50,16 +63,10 @@ private slots:
 
     void preparingAgainTouchesNothing()
     {
-        {
-            Database items;
-            QVERIFY(!items.open(path(dbfiles::Items)));
-            QVERIFY(!items.exec("INSERT INTO tItems (ItemKey) VALUES ('KEEP')"));
-        }
+        QVERIFY(!execOn(path(dbfiles::Items), "INSERT INTO tItems (ItemKey) VALUES ('KEEP')"));
         QVERIFY(!PrepareDataFolder(folder));
-        Database items;
-        QVERIFY(!items.open(path(dbfiles::Items)));
-        QCOMPARE(items.scalar("SELECT count(*) FROM tItems WHERE ItemKey='KEEP'").toInt(), 1);
-        QVERIFY(!items.exec("DELETE FROM tItems"));
+        QCOMPARE(rows(path(dbfiles::Items), "SELECT ItemKey FROM tItems"), QStringList{"KEEP"});
+        QVERIFY(!execOn(path(dbfiles::Items), "DELETE FROM tItems"));
     }
 
     // Each creation starts from nothing: built twice, the file holds the same
@@ -77,13 +84,7 @@ private slots:
         const QString target = path(file);
         QStringList made[2];
         for (int round = 0; round < 2; ++round) {
-            DbError e;
-            if (file == dbfiles::TempDocs)
-                CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), target, &e);
-            else if (file == dbfiles::TempItems)
-                CreateTempItemsDB(target, path(dbfiles::Items), &e);
-            else
-                CreateItemsDB(target, &e);
+            const DbError e = create(file, target);
             QVERIFY2(!e, qPrintable(e.message));
             Database db;
             QVERIFY(!db.open(target));
@@ -215,11 +216,7 @@ private slots:
         QFETCH(QString, first);
         QFETCH(QString, second);
         const QString target = path("case-" + file);
-        DbError e;
-        if (file == dbfiles::TempItems)
-            CreateTempItemsDB(target, path(dbfiles::Items), &e);
-        else
-            CreateItemsDB(target, &e);
+        const DbError e = create(file, target);
         QVERIFY2(!e, qPrintable(e.message));
         Database db;
         QVERIFY(!db.open(target));
@@ -322,11 +319,7 @@ private slots:
         const QString target = other.filePath(dbfiles::TempDocs);
         DbError e;
         QVERIFY(!CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), target, &e).isEmpty());
-        {
-            Database db;
-            QVERIFY(!db.open(target));
-            QVERIFY(!db.exec("INSERT INTO tAgents (AgentID, AgentName) VALUES (1, 'earlier')"));
-        }
+        QVERIFY(!execOn(target, "INSERT INTO tAgents (AgentID, AgentName) VALUES (1, 'earlier')"));
         QVERIFY(CreateTempDocsDB(config, path(dbfiles::Items), target, &e).isEmpty());
         QCOMPARE(e.kind, DbError::Kind::NotFound);
         QVERIFY(e.message.contains("tCurrencies"));
@@ -359,12 +352,8 @@ private slots:
         const DbError e = PrepareDataFolder(data.path());
         QVERIFY2(!e, qPrintable(e.message));
         QVERIFY(MissingObjects(items).isEmpty());
-        Database db;
-        QVERIFY(!db.open(items));
-        QCOMPARE(db.tableNames(), QStringList({"tItems", "tAlterKeys", "tAlterPrices", "tAccountDef", "tPriceList"}));
-        QCOMPARE(db.queryNames(), QStringList({"qSelectItems", "qSelectMarkedItems", "qEditItems"}));
         QCOMPARE(rows(items, "SELECT ItemKey, Copies FROM qSelectMarkedItems"), made.isEmpty() ? QStringList() : QStringList{"K1|2"});
-        QVERIFY(db.prepare("SELECT FldID, FldMaxLen, Label2Name FROM tAccountDef").isValid());
+        QCOMPARE(rows(items, "SELECT count(FldID), count(FldMaxLen), count(Label2Name) FROM tAccountDef"), QStringList{"0|0|0"});
     }
 
     // A documents database whose creation stopped before its links is built
@@ -381,12 +370,8 @@ private slots:
         const QString docs = path(dbfiles::TempDocs);
         DbError e;
         QVERIFY(!CreateTempDocsDB(path(dbfiles::Config), path(dbfiles::Items), docs, &e).isEmpty());
-        {
-            Database db;
-            QVERIFY(!db.open(docs));
-            QVERIFY(!db.exec("INSERT INTO tAgents (AgentID, AgentName) VALUES (1, 'A')"));
-            QVERIFY(!db.exec(linked ? "DELETE FROM tgrObjects WHERE Kind <> 'link'" : "DELETE FROM tgrObjects"));
-        }
+        QVERIFY(!execOn(docs, QStringLiteral("INSERT INTO tAgents (AgentID, AgentName) VALUES (1, 'A'); DELETE FROM tgrObjects%1")
+                                  .arg(linked ? " WHERE Kind <> 'link'" : "")));
         QStringList repaired;
         QVERIFY(!(e = RepairDataFolder(folder, &repaired)));
         QCOMPARE(repaired, QStringList{dbfiles::TempDocs});
@@ -413,14 +398,11 @@ private slots:
         const QString mineName = QFileInfo(mine).fileName();
         const QStringList planted{deadName, deadName + "-journal", mineName, "tgrmitm.tdb.building-elsewhere-1",
                                   "notes.building-x-1", "tagora.tdb.new", "tgrmitm.tdb.bak"};
-        for (const QString& name : planted) {
-            QFile f(data.filePath(name));
-            QVERIFY(f.open(QIODevice::WriteOnly));
-        }
+        for (const QString& name : planted)
+            QVERIFY(QFile(data.filePath(name)).open(QIODevice::WriteOnly));
         QVERIFY(!RepairDataFolder(data.path()));
-        QStringList expected{mineName, "tgrmitm.tdb.building-elsewhere-1", "notes.building-x-1", "tgrmitm.tdb.bak"};
-        expected.sort();
-        QCOMPARE(QDir(data.path()).entryList(QDir::Files | QDir::Hidden, QDir::Name), expected);
+        QCOMPARE(QDir(data.path()).entryList(QDir::Files | QDir::Hidden, QDir::Name),
+                 QStringList({"notes.building-x-1", "tgrmitm.tdb.bak", "tgrmitm.tdb.building-elsewhere-1", mineName}));
     }
 
     void upgrade()

@@ -29,3 +29,12 @@ inline QVariant scalar(const QString& dbPath, const QString& sql)
     db.open(dbPath);
     return db.scalar(sql);
 }
+
+// Runs sql on an existing file, to set up or change its rows.
+inline tagora::DbError execOn(const QString& dbPath, const QString& sql)
+{
+    tagora::Database db;
+    if (tagora::DbError e = db.open(dbPath))
+        return e;
+    return db.exec(sql);
+}

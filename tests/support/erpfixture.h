@@ -4,11 +4,14 @@
 // sources from the folder ODBCSYSINI names and user data sources from the file
 // ODBCINI names, so nothing of the user's own is read or changed.
 #include "erp/democompany.h"
+#include "erp/odbc.h"
 
 #include <QDir>
 #include <QFile>
 #include <QTemporaryDir>
 #include <QTextStream>
+
+#include <memory>
 
 struct OdbcSandbox {
     QTemporaryDir dir;
@@ -43,3 +46,17 @@ struct OdbcSandbox {
         return path;
     }
 };
+
+// A connection opened on `text`, or null with the driver's message in error.
+inline std::unique_ptr<tagora::ErpConnection> openErp(const QString& text, QString* error, int seconds = 30)
+{
+    auto c = std::make_unique<tagora::ErpConnection>();
+    return c->open(text, seconds, error) ? std::move(c) : nullptr;
+}
+
+// The first value of a query's first row; invalid when there is none.
+inline QVariant firstValue(tagora::ErpConnection& c, const QString& sql, QString* error)
+{
+    auto rs = c.query(sql, error);
+    return rs && rs->next() ? rs->value(0) : QVariant();
+}
