@@ -115,7 +115,16 @@ public:
 
     bool setVariable(const QString& name, const QString& text, RunTrace& trace, QString* error) override
     {
-        return call(*m_app, QStringLiteral("LabelSetVar"), {trace.labelId, name, text, -9999, -9999}, error);
+        // One list for every variable of the run, its changing places set in
+        // turn: a run sends tens of fields per record.
+        if (m_setVarArgs.isEmpty())
+            m_setVarArgs = {trace.labelId, name, text, -9999, -9999};
+        else {
+            m_setVarArgs[0] = trace.labelId;
+            m_setVarArgs[1] = name;
+            m_setVarArgs[2] = text;
+        }
+        return call(*m_app, QStringLiteral("LabelSetVar"), m_setVarArgs, error);
     }
 
     bool printRecord(int copies, RunTrace& trace, QString* error) override
@@ -162,6 +171,7 @@ private:
     }
 
     bool m_sheets;
+    QVariantList m_setVarArgs;
 };
 
 // Collects records (one AddRecord before each after the first, a quantity per

@@ -7,6 +7,7 @@
 #include "platform/progress.h"
 
 #include <QDateTime>
+#include <QElapsedTimer>
 #include <QHash>
 #include <QThread>
 #include <cmath>
@@ -127,6 +128,7 @@ private:
 
         QString current;
         long long counter = 0;
+        QElapsedTimer sincePump;
         qlonglong lastWiz = -1, lastNumber = -1;
         Statement::Step step;
         while ((step = m_records.step()) == Statement::Step::Row) {
@@ -164,10 +166,14 @@ private:
             m_trace.step = 7;
             if (!sendVariables(priceFormat))
                 return false;
-            if (m_pump)
+            // Often enough for the window to stay responsive, rarely enough
+            // that a fast program is not held up by an empty event queue.
+            if (m_pump && (!sincePump.isValid() || sincePump.elapsed() >= PumpIntervalMs)) {
                 m_pump();
+                sincePump.start();
+            }
             QVariant copies;
-            if (!column(QStringLiteral("Copies"), &copies))
+            if (!column(QStringLiteral("Copies"), &copies, &m_copiesColumn))
                 return false;
             // A record without copies prints none rather than stopping the run.
             if (!m_program->printRecord(wholeNumber(copies), m_trace, &m_error))
@@ -185,6 +191,25 @@ private:
             m_progress->setMessage(QStringLiteral("הכנת המדבקות הסתיימה"));
         result.status = LabelRunResult::Status::Done;
         return true;
+    }
+
+    // As column(name), with the index kept in *slot after the first record.
+    bool column(const QString& name, QVariant* value, int* slot)
+    {
+        if (*slot == Unresolved)
+            *slot = columnIndex(name);
+        if (*slot < 0)
+            return fail(QStringLiteral("העמודה %1 אינה ברשומת המדבקה").arg(name));
+        *value = m_records.value(*slot);
+        return true;
+    }
+
+    int columnIndex(const QString& name)
+    {
+        auto it = m_columns.constFind(name);
+        if (it == m_columns.constEnd())
+            it = m_columns.insert(name, m_records.columnIndex(name));
+        return it.value();
     }
 
     bool column(const QString& name, QVariant* value)
@@ -224,7 +249,7 @@ private:
     bool labelFor(QString* file)
     {
         QVariant account;
-        if (!column(QStringLiteral("AccountKey"), &account))
+        if (!column(QStringLiteral("AccountKey"), &account, &m_accountColumn))
             return false;
         const QString key = text(account);
         QString label;
@@ -255,9 +280,12 @@ private:
 
     bool sendVariables(const QString& priceFormat)
     {
-        for (const SentField& f : m_r.fields) {
+        if (m_fieldColumns.size() != m_r.fields.size())
+            m_fieldColumns.assign(m_r.fields.size(), Unresolved);
+        for (size_t i = 0; i < m_r.fields.size(); ++i) {
+            const SentField& f = m_r.fields[i];
             QVariant value;
-            if (!column(f.column, &value))
+            if (!column(f.column, &value, &m_fieldColumns[i]))
                 return false;
             const QString t = f.price ? FormatNumber(value, priceFormat) : text(value);
             m_trace.lastVar = f.name;
@@ -280,7 +308,12 @@ private:
     const std::function<void()>& m_pump;
     Database m_db;
     Statement m_records;
+    static constexpr int Unresolved = -2;
+    static constexpr qint64 PumpIntervalMs = 25;
     QHash<QString, int> m_columns;
+    std::vector<int> m_fieldColumns;
+    int m_copiesColumn = Unresolved;
+    int m_accountColumn = Unresolved;
     std::vector<AccountLabel> m_definitions;
     std::unique_ptr<LabelProgram> m_program;
     RunTrace m_trace;

@@ -45,7 +45,8 @@ struct LabelRunResult {
 // file per record (default, per-account, second label for long values, the
 // list's own path), header labels per document, the delay between records.
 // The database and every automation object are released whatever happens.
-// pumpEvents is called once per record, between its variables and its print.
+// pumpEvents is called between a record's variables and its print: for the
+// first record, then whenever 25 ms or more have passed since the last call.
 LabelRunResult RunLabelProgram(const LabelRunRequest& request, const AutomationRegistry& registry,
                                ProgressSink* progress, const std::function<void()>& pumpEvents);
 

@@ -1,8 +1,9 @@
 #include "labels/numberformat.h"
 
-#include <QRegularExpression>
+#include <QHash>
 #include <QStringList>
 #include <cmath>
+#include <memory>
 
 namespace tagora {
 
@@ -155,11 +156,79 @@ QString render(double value, const Section& s, bool withSign)
     if (s.grouping)
         for (int i = int(whole.size()) - 3; i > 0; i -= 3)
             whole.insert(i, QLatin1Char(','));
-    const bool zero = !(whole + frac).contains(QRegularExpression(QStringLiteral("[1-9]")));
+    const auto nonZero = [](const QString& digits) {
+        for (const QChar c : digits)
+            if (c >= QLatin1Char('1') && c <= QLatin1Char('9'))
+                return true;
+        return false;
+    };
+    const bool zero = !nonZero(whole) && !nonZero(frac);
     QString out = whole;
     if (s.point)
         out += QLatin1Char('.') + frac;
     return (withSign && value < 0 && !zero ? QStringLiteral("-") : QString()) + s.prefix + out + s.suffix;
+}
+
+// A pattern as the formatter uses it, parsed once: a run formats every
+// price of every record with the same one.
+struct Pattern {
+    bool general = false;
+    int sectionCount = 0;
+    Section positive;
+    Section negative;
+    Section zero;
+    bool hasNegative = false;
+    bool hasZero = false;
+};
+
+std::shared_ptr<const Pattern> compile(const QString& pattern)
+{
+    auto out = std::make_shared<Pattern>();
+    const QString p = named(pattern);
+    if (p.trimmed().isEmpty() || p.trimmed().compare(QLatin1String("general number"), Qt::CaseInsensitive) == 0) {
+        out->general = true;
+        return out;
+    }
+    const QStringList parts = sections(p);
+    out->sectionCount = int(parts.size());
+    out->positive = parse(parts[0]);
+    out->hasNegative = parts.size() >= 2 && !parts[1].isEmpty();
+    if (out->hasNegative)
+        out->negative = parse(parts[1]);
+    out->hasZero = parts.size() >= 3 && !parts[2].isEmpty();
+    if (out->hasZero)
+        out->zero = parse(parts[2]);
+    return out;
+}
+
+std::shared_ptr<const Pattern> compiled(const QString& pattern)
+{
+    // Per thread, so no lock; bounded, since patterns come from users.
+    thread_local QHash<QString, std::shared_ptr<const Pattern>> cache;
+    auto it = cache.constFind(pattern);
+    if (it != cache.constEnd())
+        return it.value();
+    if (cache.size() >= 64)
+        cache.clear();
+    return cache.insert(pattern, compile(pattern)).value();
+}
+
+// The value as a number, the same one its text would read back as: a
+// double's text is its shortest round-trip form, and an integer's text is
+// exact, so both convert directly.
+bool numberOf(const QVariant& value, double* out)
+{
+    switch (value.metaType().id()) {
+    case QMetaType::Double: *out = value.toDouble(); return true;
+    case QMetaType::Int: *out = double(value.toInt()); return true;
+    case QMetaType::UInt: *out = double(value.toUInt()); return true;
+    case QMetaType::LongLong: *out = double(value.toLongLong()); return true;
+    case QMetaType::ULongLong: *out = double(value.toULongLong()); return true;
+    default: break;
+    }
+    bool ok = false;
+    *out = value.toString().trimmed().toDouble(&ok);
+    return ok;
 }
 } // namespace
 
@@ -167,19 +236,17 @@ QString FormatNumber(const QVariant& value, const QString& pattern)
 {
     if (!value.isValid() || value.isNull())
         return QString();
-    bool ok = false;
-    const double v = value.toString().trimmed().toDouble(&ok);
-    if (!ok || !std::isfinite(v))
+    double v = 0;
+    if (!numberOf(value, &v) || !std::isfinite(v))
         return value.toString();
-    const QString p = named(pattern);
-    if (p.trimmed().isEmpty() || p.trimmed().compare(QLatin1String("general number"), Qt::CaseInsensitive) == 0)
+    const std::shared_ptr<const Pattern> p = compiled(pattern);
+    if (p->general)
         return QString::number(v, 'g', 15);
-    const QStringList parts = sections(p);
-    if (v == 0 && parts.size() >= 3 && !parts[2].isEmpty())
-        return render(0, parse(parts[2]), false);
-    if (v < 0 && parts.size() >= 2 && !parts[1].isEmpty())
-        return render(-v, parse(parts[1]), false);
-    return render(v, parse(parts[0]), true);
+    if (v == 0 && p->hasZero)
+        return render(0, p->zero, false);
+    if (v < 0 && p->hasNegative)
+        return render(-v, p->negative, false);
+    return render(v, p->positive, true);
 }
 
 } // namespace tagora

@@ -2,6 +2,8 @@
 
 #include <QDir>
 
+#include <algorithm>
+
 namespace tagora {
 
 void AutomationRegistry::add(const QString& progId, std::shared_ptr<AutomationProvider> provider)
@@ -48,7 +50,14 @@ QString journalValue(const QVariant& value)
     case QMetaType::Float: return QString::number(value.toDouble(), 'g', 15);
     default: break;
     }
-    QString t = value.toString();
+    const QString t = value.toString();
+    const auto plain = [](QChar c) {
+        const char16_t u = c.unicode();
+        return u != '"' && u != '\\' && u != '\n' && u != '\r' && u != '\t';
+    };
+    // Most texts need no escape: one copy rather than a character at a time.
+    if (std::all_of(t.begin(), t.end(), plain))
+        return QLatin1Char('"') + t + QLatin1Char('"');
     QString out;
     out.reserve(t.size() + 2);
     out += QLatin1Char('"');
@@ -79,14 +88,19 @@ struct JournalProvider::Sink {
     {
         ++line;
         if (!failed) {
-            const QByteArray b = text.toUtf8() + '\n';
-            if (file.write(b) != b.size()) {
+            // One reused buffer: a run writes hundreds of thousands of lines.
+            encoded.clear();
+            encoded += text.toUtf8();
+            encoded += '\n';
+            if (file.write(encoded) != encoded.size()) {
                 failed = true;
                 error = file.errorString();
             }
         }
         return line;
     }
+
+    QByteArray encoded;
 
     void flush()
     {
@@ -100,10 +114,13 @@ struct JournalProvider::Sink {
 namespace {
 QString argList(const QVariantList& args)
 {
-    QStringList parts;
-    for (const QVariant& a : args)
-        parts << journalValue(a);
-    return parts.join(QStringLiteral(", "));
+    QString out;
+    for (qsizetype i = 0; i < args.size(); ++i) {
+        if (i > 0)
+            out += QLatin1String(", ");
+        out += journalValue(args[i]);
+    }
+    return out;
 }
 
 // Counts the time a journal call takes, formatting included.
@@ -137,7 +154,23 @@ public:
         // The line number is the answer; it is written with the line, so a
         // reader of the journal sees what each call returned.
         const qint64 next = m_sink->line + 1;
-        m_sink->write(QStringLiteral("%1.%2(%3) -> %4").arg(m_path, member, argList(args)).arg(next));
+        const QString list = argList(args);
+        if (list.contains(QLatin1Char('%')) || m_path.contains(QLatin1Char('%')) || member.contains(QLatin1Char('%'))) {
+            // The number goes to the lowest %-placeholder of the whole
+            // line, which text holding one changes; kept as lines have been.
+            m_sink->write(QStringLiteral("%1.%2(%3) -> %4").arg(m_path, member, list).arg(next));
+        } else {
+            QString line;
+            line.reserve(m_path.size() + member.size() + list.size() + 24);
+            line += m_path;
+            line += QLatin1Char('.');
+            line += member;
+            line += QLatin1Char('(');
+            line += list;
+            line += QLatin1String(") -> ");
+            line += QString::number(next);
+            m_sink->write(line);
+        }
         if (result)
             *result = QVariant(qlonglong(next));
         return ok(error);
@@ -158,7 +191,7 @@ public:
     bool setProperty(const QString& name, const QVariant& value, QString* error) override
     {
         const Timing timing(*m_sink);
-        m_sink->write(QStringLiteral("%1.%2 = %3").arg(m_path, name, journalValue(value)));
+        m_sink->write(m_path + QLatin1Char('.') + name + QLatin1String(" = ") + journalValue(value));
         return ok(error);
     }
 

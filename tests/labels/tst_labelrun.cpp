@@ -231,6 +231,49 @@ private slots:
         QCOMPARE(seen, events);
     }
 
+    // One call or assignment as its journal line: texts escaped, numbers
+    // bare, the line's number as the answer.
+    void journalLine_data()
+    {
+        QTest::addColumn<QString>("member");
+        QTest::addColumn<QVariantList>("args");
+        QTest::addColumn<bool>("property");
+        QTest::addColumn<QString>("line");
+        const QString p = "NiceLabel.Application.";
+        QTest::newRow("call") << "LabelSetVar" << QVariantList{qlonglong(2), "Price", "5.00", -9999, -9999} << false
+                              << p + "LabelSetVar(2, \"Price\", \"5.00\", -9999, -9999) -> 2";
+        QTest::newRow("no arguments") << "Quit" << QVariantList{} << false << p + "Quit() -> 2";
+        QTest::newRow("percent sign") << "LabelSetVar" << QVariantList{"Off", "50% off"} << false
+                                      << p + "LabelSetVar(\"Off\", \"50% off\") -> 2";
+        QTest::newRow("escapes") << "LabelSetVar" << QVariantList{"a\"b\\c\nd\re\tf"} << false
+                                 << p + "LabelSetVar(\"a\\\"b\\\\c\\nd\\re\\tf\") -> 2";
+        QTest::newRow("hebrew, null, boolean, double") << "Open" << QVariantList{"פריט", QVariant(), true, 2.5} << false
+                                                       << p + "Open(\"פריט\", Null, True, 2.5) -> 2";
+        QTest::newRow("property") << "LabelQty" << QVariantList{3} << true << p + "LabelQty = 3";
+        QTest::newRow("text property") << "Name" << QVariantList{"50%"} << true << p + "Name = \"50%\"";
+    }
+    void journalLine()
+    {
+        QFETCH(QString, member);
+        QFETCH(QVariantList, args);
+        QFETCH(bool, property);
+        QFETCH(QString, line);
+        const QString path = work.filePath(QStringLiteral("line%1.txt").arg(++runs));
+        {
+            JournalProvider journal(path);
+            QString error;
+            auto app = journal.create("NiceLabel.Application", &error);
+            QVERIFY(app);
+            QVariant answer;
+            QVERIFY(property ? app->setProperty(member, args.value(0), &error)
+                             : app->call(member, args, &answer, &error));
+            if (!property)
+                QCOMPARE(answer.toLongLong(), 2);
+        }
+        QCOMPARE(readJournal(path, true),
+                 (QStringList{"create NiceLabel.Application", line, "release NiceLabel.Application"}));
+    }
+
     void nullSentAsEmptyText()
     {
         LabelData data;
