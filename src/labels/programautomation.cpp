@@ -2,7 +2,7 @@
 
 #include <QDir>
 
-#include <algorithm>
+#include <charconv>
 
 namespace tagora {
 
@@ -33,45 +33,61 @@ std::shared_ptr<AutomationObject> AutomationRegistry::create(const QString& prog
     return provider->create(progId, error);
 }
 
-QString journalValue(const QVariant& value)
+namespace {
+void appendInteger(QString& out, long long v)
 {
-    if (!value.isValid() || value.isNull())
-        return QStringLiteral("Null");
+    char digits[24];
+    const auto end = std::to_chars(digits, digits + sizeof digits, v).ptr;
+    out += QLatin1String(digits, end - digits);
+}
+
+// Appends the value as the journal writes it, straight onto the line.
+void appendJournalValue(QString& out, const QVariant& value)
+{
+    if (!value.isValid() || value.isNull()) {
+        out += QLatin1String("Null");
+        return;
+    }
     switch (value.metaType().id()) {
-    case QMetaType::Bool: return value.toBool() ? QStringLiteral("True") : QStringLiteral("False");
+    case QMetaType::Bool: out += value.toBool() ? QLatin1String("True") : QLatin1String("False"); return;
     case QMetaType::Int:
     case QMetaType::UInt:
     case QMetaType::Short:
     case QMetaType::UShort:
     case QMetaType::LongLong:
     case QMetaType::ULongLong:
-    case QMetaType::Long: return QString::number(value.toLongLong());
+    case QMetaType::Long: appendInteger(out, value.toLongLong()); return;
     case QMetaType::Double:
-    case QMetaType::Float: return QString::number(value.toDouble(), 'g', 15);
+    case QMetaType::Float: out += QString::number(value.toDouble(), 'g', 15); return;
     default: break;
     }
-    const QString t = value.toString();
-    const auto plain = [](QChar c) {
-        const char16_t u = c.unicode();
-        return u != '"' && u != '\\' && u != '\n' && u != '\r' && u != '\t';
-    };
-    // Most texts need no escape: one copy rather than a character at a time.
-    if (std::all_of(t.begin(), t.end(), plain))
-        return QLatin1Char('"') + t + QLatin1Char('"');
-    QString out;
-    out.reserve(t.size() + 2);
+    const QString t = value.metaType().id() == QMetaType::QString ? *static_cast<const QString*>(value.constData())
+                                                                   : value.toString();
     out += QLatin1Char('"');
-    for (const QChar c : t) {
-        switch (c.unicode()) {
-        case '"': out += QLatin1String("\\\""); break;
-        case '\\': out += QLatin1String("\\\\"); break;
-        case '\n': out += QLatin1String("\\n"); break;
-        case '\r': out += QLatin1String("\\r"); break;
-        case '\t': out += QLatin1String("\\t"); break;
-        default: out += c;
+    qsizetype from = 0;
+    for (qsizetype i = 0; i < t.size(); ++i) {
+        QLatin1String escaped;
+        switch (t[i].unicode()) {
+        case '"': escaped = QLatin1String("\\\""); break;
+        case '\\': escaped = QLatin1String("\\\\"); break;
+        case '\n': escaped = QLatin1String("\\n"); break;
+        case '\r': escaped = QLatin1String("\\r"); break;
+        case '\t': escaped = QLatin1String("\\t"); break;
+        default: continue;
         }
+        out += QStringView(t).mid(from, i - from);
+        out += escaped;
+        from = i + 1;
     }
+    out += QStringView(t).mid(from);
     out += QLatin1Char('"');
+}
+} // namespace
+
+QString journalValue(const QVariant& value)
+{
+    QString out;
+    appendJournalValue(out, value);
     return out;
 }
 
@@ -81,45 +97,90 @@ struct JournalProvider::Sink {
     qint64 nanos = 0;
     bool failed = false;
     QString error;
+    QString text; // the line being built
 
     // Writes one line; its number is the answer of a call. Lines are
     // buffered and reach the file at the latest when the program is released.
     qint64 write(const QString& text)
     {
         ++line;
-        if (!failed) {
-            // One reused buffer: a run writes hundreds of thousands of lines.
-            encoded.clear();
-            encoded += text.toUtf8();
-            encoded += '\n';
-            if (file.write(encoded) != encoded.size()) {
-                failed = true;
-                error = file.errorString();
-            }
-        }
+        if (failed)
+            return line;
+        encode(text);
+        pending += '\n';
+        if (pending.size() >= BufferBytes)
+            drain();
         return line;
     }
 
-    QByteArray encoded;
-
     void flush()
     {
+        drain();
         if (!failed && !file.flush()) {
             failed = true;
             error = file.errorString();
         }
     }
+
+private:
+    static constexpr qsizetype BufferBytes = 64 * 1024;
+    QByteArray pending;
+
+    // UTF-8 written in place; text with surrogates (rare) goes through Qt's
+    // encoder, which also decides what a lone one becomes.
+    void encode(const QString& text)
+    {
+        qsizetype at = pending.size();
+        pending.resize(at + text.size() * 3);
+        char* out = pending.data() + at;
+        for (const QChar c : text) {
+            const char16_t u = c.unicode();
+            if (u < 0x80) {
+                *out++ = char(u);
+            } else if (u < 0x800) {
+                *out++ = char(0xC0 | (u >> 6));
+                *out++ = char(0x80 | (u & 0x3F));
+            } else if (c.isSurrogate()) {
+                pending.resize(at);
+                pending += text.toUtf8();
+                return;
+            } else {
+                *out++ = char(0xE0 | (u >> 12));
+                *out++ = char(0x80 | ((u >> 6) & 0x3F));
+                *out++ = char(0x80 | (u & 0x3F));
+            }
+        }
+        pending.resize(out - pending.constData());
+    }
+
+    void drain()
+    {
+        if (failed || pending.isEmpty()) {
+            pending.resize(0);
+            return;
+        }
+        if (file.write(pending) != pending.size()) {
+            failed = true;
+            error = file.errorString();
+        }
+        pending.resize(0);
+    }
 };
 
 namespace {
-QString argList(const QVariantList& args)
+void appendArgs(QString& out, const QVariantList& args)
 {
-    QString out;
     for (qsizetype i = 0; i < args.size(); ++i) {
         if (i > 0)
             out += QLatin1String(", ");
-        out += journalValue(args[i]);
+        appendJournalValue(out, args[i]);
     }
+}
+
+QString argList(const QVariantList& args)
+{
+    QString out;
+    appendArgs(out, args);
     return out;
 }
 
@@ -154,21 +215,23 @@ public:
         // The line number is the answer; it is written with the line, so a
         // reader of the journal sees what each call returned.
         const qint64 next = m_sink->line + 1;
-        const QString list = argList(args);
-        if (list.contains(QLatin1Char('%')) || m_path.contains(QLatin1Char('%')) || member.contains(QLatin1Char('%'))) {
+        // One line buffer for every call: its capacity stays between calls.
+        QString& line = m_sink->text;
+        line.resize(0);
+        line += m_path;
+        line += QLatin1Char('.');
+        line += member;
+        line += QLatin1Char('(');
+        const qsizetype listStart = line.size();
+        appendArgs(line, args);
+        if (line.contains(QLatin1Char('%'))) {
             // The number goes to the lowest %-placeholder of the whole
             // line, which text holding one changes; kept as lines have been.
+            const QString list = line.mid(listStart);
             m_sink->write(QStringLiteral("%1.%2(%3) -> %4").arg(m_path, member, list).arg(next));
         } else {
-            QString line;
-            line.reserve(m_path.size() + member.size() + list.size() + 24);
-            line += m_path;
-            line += QLatin1Char('.');
-            line += member;
-            line += QLatin1Char('(');
-            line += list;
             line += QLatin1String(") -> ");
-            line += QString::number(next);
+            appendInteger(line, next);
             m_sink->write(line);
         }
         if (result)
@@ -191,7 +254,14 @@ public:
     bool setProperty(const QString& name, const QVariant& value, QString* error) override
     {
         const Timing timing(*m_sink);
-        m_sink->write(m_path + QLatin1Char('.') + name + QLatin1String(" = ") + journalValue(value));
+        QString& line = m_sink->text;
+        line.resize(0);
+        line += m_path;
+        line += QLatin1Char('.');
+        line += name;
+        line += QLatin1String(" = ");
+        appendJournalValue(line, value);
+        m_sink->write(line);
         return ok(error);
     }
 
