@@ -201,16 +201,23 @@ std::shared_ptr<const Pattern> compile(const QString& pattern)
     return out;
 }
 
-std::shared_ptr<const Pattern> compiled(const QString& pattern)
+const std::shared_ptr<const Pattern>& compiled(const QString& pattern)
 {
     // Per thread, so no lock; bounded, since patterns come from users.
     thread_local QHash<QString, std::shared_ptr<const Pattern>> cache;
+    thread_local QString lastPattern;
+    thread_local std::shared_ptr<const Pattern> last;
+    if (last && pattern == lastPattern)
+        return last;
     auto it = cache.constFind(pattern);
-    if (it != cache.constEnd())
-        return it.value();
-    if (cache.size() >= 64)
-        cache.clear();
-    return cache.insert(pattern, compile(pattern)).value();
+    if (it == cache.constEnd()) {
+        if (cache.size() >= 64)
+            cache.clear();
+        it = cache.insert(pattern, compile(pattern));
+    }
+    lastPattern = pattern;
+    last = it.value();
+    return last;
 }
 
 // The value as a number, the same one its text would read back as: a
@@ -239,7 +246,7 @@ QString FormatNumber(const QVariant& value, const QString& pattern)
     double v = 0;
     if (!numberOf(value, &v) || !std::isfinite(v))
         return value.toString();
-    const std::shared_ptr<const Pattern> p = compiled(pattern);
+    const Pattern* p = compiled(pattern).get();
     if (p->general)
         return QString::number(v, 'g', 15);
     if (v == 0 && p->hasZero)

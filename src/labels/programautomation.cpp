@@ -50,11 +50,11 @@ void appendJournalValue(QString& out, const QVariant& value)
     }
     switch (value.metaType().id()) {
     case QMetaType::Bool: out += value.toBool() ? QLatin1String("True") : QLatin1String("False"); return;
-    case QMetaType::Int:
+    case QMetaType::Int: appendInteger(out, *static_cast<const int*>(value.constData())); return;
+    case QMetaType::LongLong: appendInteger(out, *static_cast<const qlonglong*>(value.constData())); return;
     case QMetaType::UInt:
     case QMetaType::Short:
     case QMetaType::UShort:
-    case QMetaType::LongLong:
     case QMetaType::ULongLong:
     case QMetaType::Long: appendInteger(out, value.toLongLong()); return;
     case QMetaType::Double:
