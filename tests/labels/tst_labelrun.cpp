@@ -249,6 +249,8 @@ private slots:
                                  << p + "LabelSetVar(\"a\\\"b\\\\c\\nd\\re\\tf\") -> 2";
         QTest::newRow("hebrew, null, boolean, double") << "Open" << QVariantList{"פריט", QVariant(), true, 2.5} << false
                                                        << p + "Open(\"פריט\", Null, True, 2.5) -> 2";
+        QTest::newRow("beyond the basic plane") << "LabelSetVar" << QVariantList{"a\U0001F600b"} << false
+                                                << p + "LabelSetVar(\"a\U0001F600b\") -> 2";
         QTest::newRow("property") << "LabelQty" << QVariantList{3} << true << p + "LabelQty = 3";
         QTest::newRow("text property") << "Name" << QVariantList{"50%"} << true << p + "Name = \"50%\"";
     }
@@ -272,6 +274,24 @@ private slots:
         }
         QCOMPARE(readJournal(path, true),
                  (QStringList{"create NiceLabel.Application", line, "release NiceLabel.Application"}));
+    }
+
+    // Events run during a run, between a record's variables and its print,
+    // but not necessarily for every record.
+    void eventsPumpedDuringRun()
+    {
+        LabelData data;
+        const QString path = work.filePath(QStringLiteral("pump%1.txt").arg(++runs));
+        AutomationRegistry registry;
+        registry.setFallback(std::make_shared<JournalProvider>(path));
+        int pumps = 0;
+        const LabelRunRequest r = request(data, 5);
+        const LabelRunResult result = RunLabelProgram(r, registry, nullptr, [&] { ++pumps; });
+        QCOMPARE(int(result.status), int(LabelRunResult::Status::Done));
+        const QStringList journal = readJournal(path);
+        const int records = int(journal.filter(".LabelPrint(").size());
+        QVERIFY(pumps >= 1);
+        QVERIFY(pumps <= records);
     }
 
     void nullSentAsEmptyText()
