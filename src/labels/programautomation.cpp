@@ -222,18 +222,10 @@ public:
         line += QLatin1Char('.');
         line += member;
         line += QLatin1Char('(');
-        const qsizetype listStart = line.size();
         appendArgs(line, args);
-        if (line.contains(QLatin1Char('%'))) {
-            // The number goes to the lowest %-placeholder of the whole
-            // line, which text holding one changes; kept as lines have been.
-            const QString list = line.mid(listStart);
-            m_sink->write(QStringLiteral("%1.%2(%3) -> %4").arg(m_path, member, list).arg(next));
-        } else {
-            line += QLatin1String(") -> ");
-            appendInteger(line, next);
-            m_sink->write(line);
-        }
+        line += QLatin1String(") -> ");
+        appendInteger(line, next);
+        m_sink->write(line);
         if (result)
             *result = QVariant(qlonglong(next));
         return ok(error);

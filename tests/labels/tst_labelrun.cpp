@@ -245,6 +245,9 @@ private slots:
         QTest::newRow("no arguments") << "Quit" << QVariantList{} << false << p + "Quit() -> 2";
         QTest::newRow("percent sign") << "LabelSetVar" << QVariantList{"Off", "50% off"} << false
                                       << p + "LabelSetVar(\"Off\", \"50% off\") -> 2";
+        // A value that looks like a placeholder is text: the answer stays after the arrow.
+        QTest::newRow("placeholder in a value") << "LabelSetVar" << QVariantList{"Size", "10%1"} << false
+                                                << p + "LabelSetVar(\"Size\", \"10%1\") -> 2";
         QTest::newRow("escapes") << "LabelSetVar" << QVariantList{"a\"b\\c\nd\re\tf"} << false
                                  << p + "LabelSetVar(\"a\\\"b\\\\c\\nd\\re\\tf\") -> 2";
         QTest::newRow("hebrew, null, boolean, double") << "Open" << QVariantList{"פריט", QVariant(), true, 2.5} << false
