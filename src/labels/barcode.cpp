@@ -9,7 +9,15 @@
 #include <QtEndian>
 
 #include <cmath>
+#include <optional>
 #include <zint.h>
+
+#ifdef Q_OS_UNIX
+#include <cerrno>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#endif
 
 // How the library's settings reach libzint.
 //
@@ -248,6 +256,19 @@ bool chooseSymbology(int code, const QString& data, bool fullAscii, bool checkDi
 // so a file of any other size was cut short.
 bool wholeBitmap(const QString& path)
 {
+#ifdef Q_OS_UNIX
+    // One descriptor for the header and the size: QFile would stat the file
+    // again on open and on size(), and this runs once per picture.
+    const int fd = ::open(QFile::encodeName(path).constData(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0)
+        return false;
+    char head[6];
+    struct stat st {};
+    const bool whole = ::pread(fd, head, sizeof head, 0) == ssize_t(sizeof head) && head[0] == 'B' && head[1] == 'M'
+                       && ::fstat(fd, &st) == 0 && qint64(st.st_size) == qint64(qFromLittleEndian<quint32>(head + 2));
+    ::close(fd);
+    return whole;
+#else
     QFile f(path);
     if (!f.open(QIODevice::ReadOnly))
         return false;
@@ -255,6 +276,22 @@ bool wholeBitmap(const QString& path)
     if (head.size() < 6 || !head.startsWith("BM"))
         return false;
     return f.size() == qint64(qFromLittleEndian<quint32>(head.constData() + 2));
+#endif
+}
+
+// Removes what stands at path, a link included (not its target). The job
+// folder was emptied beforehand, so "nothing there" is the usual answer and
+// must cost no more than the one call.
+bool removeStale(const QString& path)
+{
+#ifdef Q_OS_UNIX
+    return ::unlink(QFile::encodeName(path).constData()) == 0 || errno == ENOENT;
+#else
+    if (QFile::remove(path))
+        return true;
+    const QFileInfo left(path);
+    return !left.exists() && !left.isSymLink();
+#endif
 }
 
 } // namespace
@@ -402,8 +439,7 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
 
     // The page names this picture whether or not it is made, so a picture left
     // from an earlier job would be printed for this record.
-    const QFileInfo target(path);
-    if ((target.exists() || target.isSymLink()) && !QFile::remove(path))
+    if (!removeStale(path))
         return failFile(QStringLiteral("לא ניתן למחוק את התמונה הקודמת '%1'").arg(shownPath));
     if (!in)
         return fail(QStringLiteral("מזהה ספריית הברקודים %1 אינו פתוח").arg(handle));
@@ -451,12 +487,15 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
     const QByteArray nativeName = QFile::encodeName(path);
     const bool direct = path.endsWith(QLatin1String(".bmp"), Qt::CaseInsensitive)
                         && nativeName.size() < qsizetype(sizeof symbol->outfile);
-    QTemporaryDir scratch;
+    // The scratch folder only for such names: made for every picture, it cost
+    // more than drawing the picture.
+    std::optional<QTemporaryDir> scratch;
     QString written = path;
     if (!direct) {
-        if (!scratch.isValid())
+        scratch.emplace();
+        if (!scratch->isValid())
             return failFile(QStringLiteral("אין תיקייה זמנית לתמונה"));
-        written = scratch.filePath(QStringLiteral("picture.bmp"));
+        written = scratch->filePath(QStringLiteral("picture.bmp"));
         if (QFile::encodeName(written).size() >= qsizetype(sizeof symbol->outfile))
             return failFile(QStringLiteral("שם התיקייה הזמנית ארוך מדי"));
     }
@@ -478,8 +517,8 @@ bool ZintBarcodeLibrary::A1OutputBitmap(qint32 handle, const QString& path, QStr
         QFile::remove(path);
         return failFile(QStringLiteral("לא ניתן לכתוב את התמונה אל '%1'").arg(shownPath));
     }
-    if (!QFileInfo::exists(path))
-        return failFile(QStringLiteral("התמונה '%1' לא נכתבה").arg(shownPath));
+    // wholeBitmap opened the file at its name (or rename put it there): no
+    // further look is needed to know the picture exists.
     return true;
 }
 

@@ -59,6 +59,9 @@ public:
     // refuses it). Another record would fail the same way, so a job stops.
     virtual bool A1OutputUnwritten(qint32 handle) const = 0;
     virtual void A1CloseInstance(qint32 handle) = 0;
+    // Whether outputs on different handles may run at the same time, one
+    // thread per handle, while handles are opened and closed on one thread.
+    virtual bool concurrentHandles() const { return false; }
 };
 
 // The library on libzint. Every open handle owns one zint symbol; closing the
@@ -94,6 +97,9 @@ public:
     bool A1OutputBitmap(qint32 handle, const QString& path, QString* error) override;
     bool A1OutputUnwritten(qint32 handle) const override;
     void A1CloseInstance(qint32 handle) override;
+    // Each handle owns its symbol and settings, and zint keeps no state
+    // between symbols.
+    bool concurrentHandles() const override { return true; }
 
     int openInstances() const { return int(m_instances.size()); }
 

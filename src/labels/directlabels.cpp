@@ -13,14 +13,18 @@
 #include <QSet>
 #include <QRegularExpression>
 #include <QStandardPaths>
+#include <QThread>
 #include <QStringEncoder>
 
 #ifdef Q_OS_UNIX
+#include <atomic>
 #include <cerrno>
 #include <dirent.h>
 #include <fcntl.h>
 #include <sys/stat.h>
+#include <thread>
 #include <unistd.h>
+#include <vector>
 #endif
 
 namespace tagora {
@@ -318,6 +322,63 @@ bool makesPicture(const Statement& record, int column)
 }
 } // namespace
 
+namespace {
+// One record's picture: what was read in record order, then what drawing it gave.
+struct PictureJob {
+    int record = 0;
+    int labels = 0;
+    QString data;
+    QString path;
+    bool made = false;
+    bool unwritten = false;
+    QString reason;
+};
+
+// Draws jobs on up to `threads` handles at once, each handle on one thread,
+// taking records in order. Returns the index of the first record whose
+// picture the disk would not take (jobs.size() if none). Records after it
+// were not drawn, or their pictures are removed again: the job stops there,
+// as it would have one record at a time.
+size_t drawPictures(std::vector<PictureJob>& jobs, const LabelBarDef& bar, int code, BarcodeLibrary& library,
+                    int threads)
+{
+    std::vector<qint32> handles;
+    for (int i = 0; i < threads; ++i)
+        handles.push_back(library.A1OpenInstance());
+    std::atomic<size_t> next{0};
+    std::atomic<size_t> firstUnwritten{jobs.size()};
+    auto work = [&](qint32 handle) {
+        for (size_t i; (i = next.fetch_add(1)) < jobs.size();) {
+            // Indices only grow: once past a failure, every later one is too.
+            if (i > firstUnwritten.load())
+                break;
+            PictureJob& j = jobs[i];
+            j.made = DrawBarcode(j.data, j.path, bar, code, library, handle, &j.reason, &j.unwritten);
+            if (!j.made && j.unwritten) {
+                size_t seen = firstUnwritten.load();
+                while (i < seen && !firstUnwritten.compare_exchange_weak(seen, i)) {
+                }
+            }
+        }
+    };
+    std::vector<std::thread> helpers;
+    for (size_t t = 1; t < handles.size(); ++t)
+        helpers.emplace_back(work, handles[t]);
+    work(handles.front());
+    for (std::thread& t : helpers)
+        t.join();
+    for (qint32 handle : handles)
+        library.A1CloseInstance(handle);
+
+    const size_t stop = firstUnwritten.load();
+    for (size_t i = stop + 1; i < jobs.size(); ++i) {
+        if (jobs[i].made)
+            QFile::remove(jobs[i].path);
+    }
+    return stop;
+}
+} // namespace
+
 QString MakeBarcodeImages(const QString& folder, const QString& column, int fieldIndex, const QString& dbPath,
                           const QString& sql, LabelBarDef& bar, BarcodeLibrary& library,
                           QVector<BarcodeRefusal>* refusals)
@@ -339,38 +400,50 @@ QString MakeBarcodeImages(const QString& folder, const QString& column, int fiel
         return QStringLiteral("העמודה %1 אינה ברשומת המדבקה").arg(column);
     const int copiesColumn = records.columnIndex(QStringLiteral("Copies"));
     const int code = libraryBarType(bar.BarType, bar);
-    const int handle = library.A1OpenInstance();
+
+    // The values are read first, in order (the database on one thread); the
+    // pictures, each independent of the others, are then drawn in parallel.
+    const QDir dir(folder);
+    std::vector<PictureJob> jobs;
     int record = 0;
-    QString failure;
     for (; step == Statement::Step::Row; step = records.step()) {
         ++record;
         if (!makesPicture(records, col))
             continue;
-        const QVariant value = records.value(col);
-        QString data = value.toString();
+        PictureJob j;
+        j.record = record;
+        j.labels = copiesOf(copiesColumn >= 0 ? records.value(copiesColumn) : QVariant());
+        j.data = records.value(col).toString();
         if (bar.LeftLen > 0)
-            data = data.left(bar.LeftLen);
+            j.data = j.data.left(bar.LeftLen);
         if (!bar.LeftPrefix.isEmpty())
-            data = bar.LeftPrefix + data;
-        QString reason;
-        bool unwritten = false;
-        if (DrawBarcode(data, QDir(folder).filePath(BarcodeImageName(fieldIndex, record)), bar, code, library, handle,
-                        &reason, &unwritten))
-            continue;
-        // A picture the disk would not take is no reason to print labels
-        // without it: every record after it would fail the same way.
-        if (unwritten) {
-            failure = QStringLiteral("לא ניתן לכתוב את תמונות הברקוד בתיקייה '%1', ולכן לא הודפסו מדבקות.\n%2")
-                          .arg(QDir::toNativeSeparators(folder), reason);
-            break;
-        }
-        if (refusals)
-            refusals->push_back({record, copiesOf(copiesColumn >= 0 ? records.value(copiesColumn) : QVariant()), data,
-                                 reason});
+            j.data = bar.LeftPrefix + j.data;
+        j.path = dir.filePath(BarcodeImageName(fieldIndex, record));
+        jobs.push_back(std::move(j));
     }
-    if (failure.isEmpty() && step == Statement::Step::Error)
+
+    // Too few pictures are not worth a thread's start.
+    constexpr size_t kPicturesPerThread = 64;
+    const size_t useful = qMax<size_t>(1, jobs.size() / kPicturesPerThread);
+    const int threads = library.concurrentHandles()
+                            ? int(qMin<size_t>(useful, size_t(qMax(1, QThread::idealThreadCount()))))
+                            : 1;
+    const size_t stop = jobs.empty() ? 0 : drawPictures(jobs, bar, code, library, threads);
+
+    QString failure;
+    // Refusals before the stop, in record order; a picture the disk would not
+    // take is no reason to print labels without it: every record after it
+    // would fail the same way.
+    for (size_t i = 0; i < stop && i < jobs.size(); ++i) {
+        const PictureJob& j = jobs[i];
+        if (!j.made && refusals)
+            refusals->push_back({j.record, j.labels, j.data, j.reason});
+    }
+    if (stop < jobs.size())
+        failure = QStringLiteral("לא ניתן לכתוב את תמונות הברקוד בתיקייה '%1', ולכן לא הודפסו מדבקות.\n%2")
+                      .arg(QDir::toNativeSeparators(folder), jobs[stop].reason);
+    else if (step == Statement::Step::Error)
         failure = records.error().message;
-    library.A1CloseInstance(handle);
     return failure;
 }
 

@@ -291,6 +291,37 @@ private slots:
             QVERIFY2(report[2].contains(QStringLiteral("לא נכתבה במלואה")), qPrintable(report[2]));
     }
 
+    // A link planted at the picture's name is taken away, not written
+    // through: whatever it points at stays as it was.
+    void linkAtName_data()
+    {
+        QTest::addColumn<bool>("dangling");
+        QTest::newRow("link to a file") << false;
+        QTest::newRow("dangling link") << true;
+    }
+    void linkAtName()
+    {
+        QFETCH(bool, dangling);
+        QTemporaryDir dir;
+        const QString target = dir.filePath(QStringLiteral("outside.txt"));
+        if (!dangling)
+            writeStale(target);
+        const QString file = dir.filePath(BarcodeImageName(1, 7));
+        QVERIFY(QFile::link(target, file));
+        QString error;
+
+        QVERIFY2(drawWithZint(2, QStringLiteral("Item"), LabelBarDef(), file, &error), qPrintable(error));
+
+        QVERIFY(!QFileInfo(file).isSymLink());
+        QCOMPARE(decode(file).second, QStringLiteral("Item"));
+        QFile outside(target);
+        QCOMPARE(outside.exists(), !dangling);
+        if (!dangling) {
+            QVERIFY(outside.open(QIODevice::ReadOnly));
+            QCOMPARE(outside.readAll(), QByteArray("a picture from an earlier job"));
+        }
+    }
+
     void closedHandle()
     {
         QTemporaryDir dir;

@@ -602,6 +602,96 @@ private slots:
         QCOMPARE(st.st_mode & 07777, mode_t(0700));
     }
 
+    // Enough records that the pictures are drawn on several threads: refusals
+    // still come in record order, every picture is the one a single handle
+    // draws for its value, and a picture the disk will not take stops the job
+    // at that record, with no picture after it.
+    void picturesInRecordOrder_data()
+    {
+        QTest::addColumn<int>("items");
+        QTest::addColumn<int>("refusedEvery"); // every n-th record holds a value Code 128 cannot carry; 0: none
+        QTest::addColumn<int>("tooLargeAt");   // the record whose picture outgrows the disk; 0: none
+        QTest::newRow("few records, one refused") << 5 << 2 << 0;
+        QTest::newRow("many records, none refused") << 400 << 0 << 0;
+        QTest::newRow("many records, refusals spread") << 400 << 7 << 0;
+        QTest::newRow("disk full midway") << 400 << 7 << 250;
+        QTest::newRow("disk full at the first record") << 400 << 0 << 1;
+        QTest::newRow("disk full at the last record") << 400 << 7 << 400;
+    }
+    void picturesInRecordOrder()
+    {
+        QFETCH(int, items);
+        QFETCH(int, refusedEvery);
+        QFETCH(int, tooLargeAt);
+        auto value = [&](int r) {
+            if (r == tooLargeAt)
+                return QStringLiteral("LONG-%1").arg(QString(40, QLatin1Char('X')));
+            if (refusedEvery > 0 && r % refusedEvery == 0)
+                return QStringLiteral("א-%1").arg(r);
+            return QStringLiteral("TG-%1").arg(r, 7, 10, QLatin1Char('0'));
+        };
+        QStringList rows;
+        for (int r = 1; r <= items; ++r)
+            rows << QStringLiteral("('K%1', 'n', '%2', 'ILS', %3, 1)").arg(r, 4, 10, QLatin1Char('0')).arg(value(r)).arg(r % 3 + 1);
+        LabelData data("DELETE FROM tItems; INSERT INTO tItems (ItemKey, ItemName, BarCode, Coin, Copies, PrintLabel) VALUES "
+                       + rows.join(',') + ';');
+
+        // A limit between an ordinary picture and the long one, measured, not guessed.
+        const QString folder = work.filePath(QStringLiteral("order-%1-%2-%3").arg(items).arg(refusedEvery).arg(tooLargeAt));
+        QVERIFY(QDir().mkpath(folder));
+        LabelBarDef bar;
+        bar.BarType = 2;
+        auto reference = [&](const QString& v) {
+            const QString file = folder + QStringLiteral("/reference.bmp");
+            ZintBarcodeLibrary lib;
+            LabelBarDef copy = bar;
+            const int code = libraryBarType(copy.BarType, copy);
+            const qint32 handle = lib.A1OpenInstance();
+            QString error;
+            const QByteArray bytes = DrawBarcode(v, file, copy, code, lib, handle, &error) ? readFile(file) : QByteArray();
+            QFile::remove(file);
+            return bytes;
+        };
+        const qint64 ordinary = reference(QStringLiteral("TG-0000001")).size();
+        const qint64 large = reference(QStringLiteral("LONG-%1").arg(QString(40, QLatin1Char('X')))).size();
+        QVERIFY2(ordinary > 0 && large > ordinary, qPrintable(QStringLiteral("%1 %2").arg(ordinary).arg(large)));
+        const rlim_t limit = tooLargeAt > 0 ? rlim_t((ordinary + large) / 2) : RLIM_INFINITY;
+
+        LabelQuerySettings q;
+        q.sent[4] = true;
+        const QString sql = BuildItemQuery(q, QueryByItems, OrderAscending);
+        const LimitedRun run = runWithFileLimit(limit, [&] {
+            ZintBarcodeLibrary lib;
+            LabelBarDef working = bar;
+            QVector<BarcodeRefusal> refused;
+            const QString error = MakeBarcodeImages(folder, "BarCode", 4, data.docs, sql, working, lib, &refused);
+            QStringList report{error};
+            for (const BarcodeRefusal& r : refused)
+                report << QStringLiteral("%1:%2:%3").arg(r.record).arg(r.labels).arg(r.data);
+            report << QString::number(lib.openInstances());
+            return report.join(QChar(0x1e)).toUtf8();
+        });
+        QVERIFY(run.exited);
+        QStringList report = QString::fromUtf8(run.report).split(QChar(0x1e));
+        QCOMPARE(report.takeLast(), QStringLiteral("0")); // every handle closed
+        const QString error = report.takeFirst();
+        QCOMPARE(error.contains(QString::fromUtf8("לא הודפסו מדבקות")), tooLargeAt > 0);
+
+        const int stop = tooLargeAt > 0 ? tooLargeAt : items + 1;
+        QStringList expectedRefusals;
+        for (int r = 1; r <= items; ++r) {
+            const bool refused = value(r).startsWith(QString::fromUtf8("א"));
+            if (r < stop && refused)
+                expectedRefusals << QStringLiteral("%1:%2:%3").arg(r).arg(r % 3 + 1).arg(value(r));
+            const QString file = folder + '/' + BarcodeImageName(4, r);
+            const bool made = r < stop && !refused;
+            QVERIFY2(QFile::exists(file) == made, qPrintable(file));
+            if (made)
+                QVERIFY2(readFile(file) == reference(value(r)), qPrintable(file));
+        }
+        QCOMPARE(report, expectedRefusals);
+    }
+
     // A host calling the method reads the outcome; the user sees the failure.
     void createLabFileTellsHost_data()
     {
