@@ -450,8 +450,10 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
             return refuse(QStringLiteral("קובץ מסד הנתונים של ה-ERP לא נמצא: %1").arg(target.database));
         // The driver's own busy wait (100 s unless told) outlasts the
         // operation's time-out on a locked file; it takes the first key it
-        // finds, so these go in front of whatever the text holds.
-        QString keys = QStringLiteral("NoCreat=1;");
+        // finds, so these go in front of whatever the text holds. Without
+        // StepAPI the driver fetches a whole result before the first row, so
+        // its memory grows with the ERP.
+        QString keys = QStringLiteral("NoCreat=1;StepAPI=1;");
         if (timeoutSeconds > 0)
             keys += QStringLiteral("Timeout=%1;").arg(qint64(timeoutSeconds) * 1000);
         connText = keys + connText;
