@@ -215,12 +215,7 @@ public:
         // The line number is the answer; it is written with the line, so a
         // reader of the journal sees what each call returned.
         const qint64 next = m_sink->line + 1;
-        // One line buffer for every call: its capacity stays between calls.
-        QString& line = m_sink->text;
-        line.resize(0);
-        line += m_path;
-        line += QLatin1Char('.');
-        line += member;
+        QString& line = startLine(member);
         line += QLatin1Char('(');
         appendArgs(line, args);
         line += QLatin1String(") -> ");
@@ -246,11 +241,7 @@ public:
     bool setProperty(const QString& name, const QVariant& value, QString* error) override
     {
         const Timing timing(*m_sink);
-        QString& line = m_sink->text;
-        line.resize(0);
-        line += m_path;
-        line += QLatin1Char('.');
-        line += name;
+        QString& line = startLine(name);
         line += QLatin1String(" = ");
         appendJournalValue(line, value);
         m_sink->write(line);
@@ -258,6 +249,17 @@ public:
     }
 
 private:
+    // "PATH.MEMBER" in the one line buffer, whose capacity stays between calls.
+    QString& startLine(const QString& member)
+    {
+        QString& line = m_sink->text;
+        line.resize(0);
+        line += m_path;
+        line += QLatin1Char('.');
+        line += member;
+        return line;
+    }
+
     bool ok(QString* error) const
     {
         if (m_sink->failed && error)
