@@ -29,14 +29,14 @@ struct ReadError {
     QString message;
 };
 
-// The readers: each opens its own ERP connection and local database, walks
-// its query forward-only, reports progress every fifth row, writes in one
-// transaction with prepared statements, and closes everything before it
-// returns. A duplicate key in the local table skips that row; any other error
-// stops the reader (rows written before it stay) and returns false.
-// With replaceAll the item reader empties tItems first, in its own
-// transaction: it keeps all or nothing, and the old items stay until the new
-// ones are all in.
+// The readers: each opens its own ERP connection and local database and walks
+// its query forward-only, converting each row on the calling thread (which
+// also reports progress every fifth row and asks whether to cancel), while a
+// second thread writes the rows in one transaction with a prepared statement.
+// A duplicate key in the local table skips that row. Any other error on
+// either side, or a cancel, rolls the transaction back, so the local database
+// is as it was before the reader began, and the reader returns false. With
+// replaceAll the item reader empties tItems first, in that same transaction.
 bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QString& fromSort,
                       const QString& toSort, bool foreignNames, short copies, int priceList, bool byDocs,
                       bool withWarehouse, ReadError* error, bool replaceAll = false);

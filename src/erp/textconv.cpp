@@ -252,6 +252,20 @@ double NullToDouble(const QVariant& value)
 {
     if (isNullish(value))
         return 0;
+    // A number read as a number is that number: its text reads back to the
+    // same double, so the detour through text is skipped.
+    switch (value.metaType().id()) {
+    case QMetaType::Double: {
+        const double d = value.toDouble();
+        return std::isfinite(d) ? d : 0;
+    }
+    case QMetaType::LongLong:
+        return double(value.toLongLong());
+    case QMetaType::Int:
+        return double(value.toInt());
+    default:
+        break;
+    }
     bool ok = false;
     const double d = value.toString().trimmed().toDouble(&ok);
     return ok && std::isfinite(d) ? d : 0;

@@ -134,6 +134,83 @@ bool Statement::bind(int position, const QVariant& value)
     return true;
 }
 
+void BindValue::setText(QStringView v)
+{
+    kind = Kind::Text;
+    // At most three bytes for each UTF-16 unit; the buffer keeps its capacity.
+    // Encoded here rather than by QString::toUtf8 only to reuse the buffer:
+    // the bytes are the same, a lone surrogate included (it becomes "?").
+    text.resize(v.size() * 3);
+    auto* out = reinterpret_cast<unsigned char*>(text.data());
+    const qsizetype n = v.size();
+    for (qsizetype i = 0; i < n; ++i) {
+        const char16_t u = v[i].unicode();
+        if (u < 0x80) {
+            *out++ = static_cast<unsigned char>(u);
+        } else if (u < 0x800) {
+            *out++ = static_cast<unsigned char>(0xC0 | (u >> 6));
+            *out++ = static_cast<unsigned char>(0x80 | (u & 0x3F));
+        } else if (QChar::isSurrogate(u)) {
+            if (QChar::isHighSurrogate(u) && i + 1 < n && v[i + 1].isLowSurrogate()) {
+                const char32_t c = QChar::surrogateToUcs4(u, v[++i].unicode());
+                *out++ = static_cast<unsigned char>(0xF0 | (c >> 18));
+                *out++ = static_cast<unsigned char>(0x80 | ((c >> 12) & 0x3F));
+                *out++ = static_cast<unsigned char>(0x80 | ((c >> 6) & 0x3F));
+                *out++ = static_cast<unsigned char>(0x80 | (c & 0x3F));
+            } else {
+                *out++ = '?';
+            }
+        } else {
+            *out++ = static_cast<unsigned char>(0xE0 | (u >> 12));
+            *out++ = static_cast<unsigned char>(0x80 | ((u >> 6) & 0x3F));
+            *out++ = static_cast<unsigned char>(0x80 | (u & 0x3F));
+        }
+    }
+    text.truncate(reinterpret_cast<char*>(out) - text.constData());
+}
+
+QVariant BindValue::toVariant() const
+{
+    switch (kind) {
+    case Kind::Null:
+        return QVariant();
+    case Kind::Integer:
+        return QVariant(qlonglong(integer));
+    case Kind::Real:
+        return QVariant(real);
+    case Kind::Text:
+        return QVariant(QString::fromUtf8(text));
+    }
+    return QVariant();
+}
+
+bool Statement::bind(int position, const BindValue& value)
+{
+    if (!m_stmt)
+        return false;
+    int rc = SQLITE_OK;
+    switch (value.kind) {
+    case BindValue::Kind::Null:
+        rc = sqlite3_bind_null(m_stmt, position);
+        break;
+    case BindValue::Kind::Integer:
+        rc = sqlite3_bind_int64(m_stmt, position, value.integer);
+        break;
+    case BindValue::Kind::Real:
+        rc = sqlite3_bind_double(m_stmt, position, value.real);
+        break;
+    case BindValue::Kind::Text:
+        rc = sqlite3_bind_text64(m_stmt, position, value.text.constData(), sqlite3_uint64(value.text.size()),
+                                 SQLITE_STATIC, SQLITE_UTF8);
+        break;
+    }
+    if (rc != SQLITE_OK) {
+        fail(rc);
+        return false;
+    }
+    return true;
+}
+
 bool Statement::bind(const QString& name, const QVariant& value)
 {
     if (!m_stmt)

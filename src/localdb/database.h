@@ -31,6 +31,40 @@ struct DbError {
 
 class Database;
 
+// A value already in the form the engine stores, so the thread that binds it
+// only hands it over: text is UTF-8 bytes, numbers are numbers. The text's
+// buffer is kept between rows, so filling it again allocates nothing.
+struct BindValue {
+    enum class Kind : unsigned char { Null, Integer, Real, Text };
+    Kind kind = Kind::Null;
+    qint64 integer = 0;
+    double real = 0;
+    QByteArray text;
+
+    void setNull() { kind = Kind::Null; }
+    void setInteger(qint64 v)
+    {
+        kind = Kind::Integer;
+        integer = v;
+    }
+    void setReal(double v)
+    {
+        kind = Kind::Real;
+        real = v;
+    }
+    void setText(QStringView v);
+    // Null for an empty text: the ERP's empty fields are stored as nothing.
+    void setTextOrNull(QStringView v)
+    {
+        if (v.isEmpty())
+            setNull();
+        else
+            setText(v);
+    }
+    // The value as the QVariant binding would have stored it.
+    QVariant toVariant() const;
+};
+
 // A prepared statement. Columns are found by name without regard to case;
 // NULL reads as a null QVariant. Bound values: null, bool (as 1/0), whole
 // numbers, doubles, text, bytes; dates as ISO text.
@@ -51,6 +85,9 @@ public:
     // prefix (":key").
     bool bind(int position, const QVariant& value);
     bool bind(const QString& name, const QVariant& value);
+    // The text is not copied: it must stay as it is until the statement has
+    // run, and be bound again before the next run.
+    bool bind(int position, const BindValue& value);
     void clearBindings();
 
     Step step();

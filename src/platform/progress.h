@@ -13,6 +13,9 @@ public:
     virtual void setMessage(const QString& text) = 0;
     // Done fraction from 0 (nothing shown) to 1 (full bar).
     virtual void setProgress(double fraction) = 0;
+    // Asked between rows of long work: true ends the work, and what it was
+    // writing is left as it was before it started.
+    virtual bool cancelRequested() { return false; }
 };
 
 } // namespace tagora

@@ -307,6 +307,59 @@ private slots:
         QCOMPARE(rows(items, "SELECT ItemKey, PrintLabel, Copies FROM tItems"), QStringList{"KEPT|1|4"});
     }
 
+    // An import stopped half way, by the user or by a row the local table
+    // refuses, keeps nothing of its rows: the table is as it was before.
+    void interruptedImportKeepsTable_data()
+    {
+        QTest::addColumn<bool>("priceLists");
+        QTest::addColumn<bool>("cancel");
+        QTest::newRow("items, row refused") << false << false;
+        QTest::newRow("items, cancelled") << false << true;
+        QTest::newRow("price lists, row refused") << true << false;
+        QTest::newRow("price lists, cancelled") << true << true;
+    }
+    void interruptedImportKeepsTable()
+    {
+        QFETCH(bool, priceLists);
+        QFETCH(bool, cancel);
+        const QString items = newItemsDb();
+        const QString staging = newStaging(items);
+        const QString db = priceLists ? staging : items;
+        const QString table = priceLists ? QStringLiteral("tTempPriceList") : QStringLiteral("tItems");
+        QVERIFY(!execOn(db, priceLists ? "INSERT INTO tTempPriceList (ItemKey, PriceList, Price) VALUES ('KEPT', 7, 1.5)"
+                                       : "INSERT INTO tItems (ItemKey, PrintLabel, Copies) VALUES ('KEPT', TRUE, 4)"));
+        if (!cancel)
+            QVERIFY(!execOn(db, QStringLiteral("CREATE TRIGGER refuse BEFORE INSERT ON %1"
+                                               " WHEN (SELECT count(*) FROM %1) >= 20 BEGIN SELECT RAISE(ABORT, 'refused'); END")
+                                    .arg(table)));
+        const QStringList before = rows(db, "SELECT * FROM " + table);
+
+        struct Sink : ProgressSink {
+            bool cancel = false;
+            int asked = 0;
+            double last = -1, most = 0;
+            void setMessage(const QString&) override {}
+            void setProgress(double f) override { last = f, most = std::max(most, f); }
+            bool cancelRequested() override { return cancel && ++asked == 3; }
+        } sink;
+        sink.cancel = cancel;
+        ErpReadContext c = ctx(2);
+        c.progress = &sink;
+        ReadError e;
+        QVERIFY(!(priceLists ? ReadPriceListPriority(c, db, {}, {}, false, table, &e)
+                             : ReadItemPriority(c, db, {}, {}, false, 1, 1, false, false, &e)));
+        QCOMPARE(rows(db, "SELECT * FROM " + table), before);
+        const QString prefix = priceLists ? "Error with price list: " : "Error reading item: ";
+        if (cancel) {
+            QCOMPARE(e.title, prefix);
+        } else {
+            QVERIFY2(e.title.size() > prefix.size() && e.title.startsWith(prefix), qPrintable(e.title));
+            QVERIFY(e.message.contains("refused"));
+        }
+        QVERIFY(sink.most > 0);
+        QCOMPARE(sink.last, 0.0);
+    }
+
     void unreachableErp_data()
     {
         QTest::addColumn<QString>("connection");
