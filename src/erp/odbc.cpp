@@ -8,6 +8,7 @@
 #include <QSet>
 
 #include <algorithm>
+#include <cmath>
 
 #include <pwd.h>
 #include <sql.h>
@@ -751,6 +752,111 @@ bool bindParams(SQLHSTMT stmt, const ErpParams& params, bool sqlite, std::vector
 }
 } // namespace
 
+namespace {
+// A value as SQLite literal text, or empty when it has none that is safe.
+QString sqliteLiteral(const QVariant& v)
+{
+    if (v.isNull())
+        return QStringLiteral("NULL");
+    switch (v.typeId()) {
+    case QMetaType::Bool:
+        return v.toBool() ? QStringLiteral("1") : QStringLiteral("0");
+    case QMetaType::Int:
+    case QMetaType::Short:
+    case QMetaType::UShort:
+    case QMetaType::Char:
+    case QMetaType::SChar:
+    case QMetaType::UChar:
+    case QMetaType::UInt:
+    case QMetaType::Long:
+    case QMetaType::LongLong:
+        return QString::number(v.toLongLong());
+    case QMetaType::Double:
+    case QMetaType::Float: {
+        const double d = v.toDouble();
+        // Seventeen digits give the same double back; an integral value
+        // keeps a decimal point so SQLite reads it as the real it was bound as.
+        if (!std::isfinite(d))
+            return QString();
+        QString t = QString::number(d, 'g', 17);
+        if (!t.contains(QLatin1Char('.')) && !t.contains(QLatin1Char('e')))
+            t += QStringLiteral(".0");
+        return t;
+    }
+    case QMetaType::QString: {
+        QString t = v.toString();
+        // The driver turns the statement's wide text into its own by single
+        // units: a character beyond 16 bits would come out broken, and might
+        // take the closing apostrophe with it. Such a value is bound instead.
+        for (const QChar ch : std::as_const(t))
+            if (ch.isNull() || ch.isSurrogate())
+                return QString();
+        t.replace(QLatin1Char('\''), QStringLiteral("''"));
+        return QLatin1Char('\'') + t + QLatin1Char('\'');
+    }
+    case QMetaType::QDate:
+    case QMetaType::QDateTime: {
+        const QDate d = v.typeId() == QMetaType::QDate ? v.toDate() : v.toDateTime().date();
+        return d.isValid() ? QLatin1Char('\'') + d.toString(Qt::ISODate) + QLatin1Char('\'') : QString();
+    }
+    default:
+        return QString();
+    }
+}
+
+// SQLite's driver reads the whole result into memory before the first row
+// when a statement has parameters, and steps row by row when it has none;
+// on a large ERP that is the import's memory. So for SQLite alone the values
+// are written into the text as SQLite literals. A text goes between
+// apostrophes with each apostrophe doubled, which is the whole of SQLite's
+// literal syntax (a backslash escapes nothing there), so a value cannot end
+// its literal early. Markers are found as SQLite finds them: not inside a
+// literal, a quoted name or a comment. Empty when a value has no safe literal
+// form (a NUL in a text, say) or the markers do not match the values: they
+// are then bound, as for every other server.
+} // namespace
+
+QString ErpConnection::inlineSqliteValues(const QString& sql, const ErpParams& params)
+{
+    QString out;
+    out.reserve(sql.size() + 16 * params.size());
+    qsizetype marker = 0;
+    const qsizetype n = sql.size();
+    for (qsizetype i = 0; i < n; ++i) {
+        const QChar c = sql[i];
+        auto copyUntil = [&](QStringView close) {
+            const qsizetype end = sql.indexOf(close, i + 1);
+            const qsizetype stop = end < 0 ? n : end + close.size();
+            out += QStringView(sql).mid(i, stop - i);
+            i = stop - 1;
+        };
+        if (c == QLatin1Char('\'') ) {
+            copyUntil(u"'"); // a doubled '' closes and reopens at once
+        } else if (c == QLatin1Char('"')) {
+            copyUntil(u"\"");
+        } else if (c == QLatin1Char('`')) {
+            copyUntil(u"`");
+        } else if (c == QLatin1Char('[')) {
+            copyUntil(u"]");
+        } else if (c == QLatin1Char('-') && i + 1 < n && sql[i + 1] == QLatin1Char('-')) {
+            copyUntil(u"\n");
+        } else if (c == QLatin1Char('/') && i + 1 < n && sql[i + 1] == QLatin1Char('*')) {
+            copyUntil(u"*/");
+        } else if (c == QLatin1Char('?')) {
+            if (marker >= params.size() || (i + 1 < n && sql[i + 1].isDigit()))
+                return QString();
+            const QString literal = sqliteLiteral(params[marker++]);
+            if (literal.isEmpty())
+                return QString();
+            // Spaces keep the literal a word of its own whatever is beside it.
+            out += QLatin1Char(' ') + literal + QLatin1Char(' ');
+        } else {
+            out += c;
+        }
+    }
+    return marker == params.size() ? out : QString();
+}
+
 std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, const ErpParams& params, QString* error)
 {
     if (!m_h->connected) {
@@ -779,12 +885,21 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, const Erp
         return nullptr;
     SQLSetStmtAttr(stmt, SQL_ATTR_CURSOR_TYPE, reinterpret_cast<SQLPOINTER>(SQL_CURSOR_FORWARD_ONLY), 0);
     SQLSetStmtAttr(stmt, SQL_ATTR_CONCURRENCY, reinterpret_cast<SQLPOINTER>(SQL_CONCUR_READ_ONLY), 0);
+    QString sent = dialectSql(statement, params);
+    ErpParams toBind = params;
+    if (isSqlite() && !params.isEmpty()) {
+        const QString withLiterals = inlineSqliteValues(sent, params);
+        if (!withLiterals.isEmpty()) {
+            sent = withLiterals;
+            toBind.clear();
+        }
+    }
     std::vector<BoundValue> bound;
-    if (!bindParams(stmt, params, isSqlite(), bound, error)) {
+    if (!bindParams(stmt, toBind, isSqlite(), bound, error)) {
         SQLFreeHandle(SQL_HANDLE_STMT, stmt);
         return nullptr;
     }
-    std::u16string text = wide(dialectSql(statement, params));
+    std::u16string text = wide(sent);
     const SQLRETURN rc = SQLExecDirectW(stmt, wptr(text), SQLINTEGER(text.size()));
     if (!SQL_SUCCEEDED(rc) && rc != SQL_NO_DATA) {
         if (error)

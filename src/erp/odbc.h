@@ -73,6 +73,11 @@ public:
     // it is taken to its day, and the value goes out as 'yyyy-mm-dd' text.
     QString dialectSql(const QString& sql, const ErpParams& params = {}) const;
     static QString rewriteForSqlite(const QString& sql, const ErpParams& params = {});
+    // The statement with its "?" values written in as SQLite literals, or
+    // empty when they cannot all be written safely (they are bound then).
+    // SQLite's driver holds a whole result in memory when a statement has
+    // parameters, and steps through it when it has none.
+    static QString inlineSqliteValues(const QString& sql, const ErpParams& params);
 
 private:
     friend class ErpRecordset;

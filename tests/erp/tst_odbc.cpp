@@ -305,6 +305,34 @@ private slots:
         QCOMPARE(erp->countRows(QStringLiteral("SELECT ID FROM TEXTS WHERE ") + where, {value}), found ? 1 : 0);
         QCOMPARE(erp->countRows(QStringLiteral("SELECT ID FROM TEXTS")), 2);
     }
+
+    // Values written into an SQLite statement: only a marker SQLite itself
+    // would take is one, and a value that has no safe literal leaves the
+    // statement to binding (empty).
+    void sqliteLiterals_data()
+    {
+        QTest::addColumn<QString>("sql");
+        QTest::addColumn<QVariantList>("values");
+        QTest::addColumn<QString>("sent");
+        QTest::newRow("marks in a comment, a name and a literal")
+            << "/* ? */ \"?\" = ? AND '?' = [?] -- ?\n AND `?` < ?" << QVariantList{1, 2.5}
+            << "/* ? */ \"?\" =  1  AND '?' = [?] -- ?\n AND `?` <  2.5 ";
+        QTest::newRow("apostrophes doubled, backslash as is")
+            << "A = ?" << QVariantList{"\\'; DELETE FROM T; --"} << "A =  '\\''; DELETE FROM T; --' ";
+        QTest::newRow("null, whole real, date")
+            << "? ? ?" << QVariantList{QVariant(), 3.0, QDate(2026, 12, 6)} << " NULL   3.0   '2026-12-06' ";
+        QTest::newRow("character beyond 16 bits") << "A = ?" << QVariantList{QString::fromUtf8("\xF0\x9F\x98\x80")} << "";
+        QTest::newRow("NUL in a text") << "A = ?" << QVariantList{QString(QChar(0))} << "";
+        QTest::newRow("more values than marks") << "A = ?" << QVariantList{1, 2} << "";
+        QTest::newRow("numbered mark") << "A = ?1" << QVariantList{1} << "";
+    }
+    void sqliteLiterals()
+    {
+        QFETCH(QString, sql);
+        QFETCH(QVariantList, values);
+        QFETCH(QString, sent);
+        QCOMPARE(ErpConnection::inlineSqliteValues(sql, values), sent);
+    }
 };
 
 QTEST_GUILESS_MAIN(TestOdbc)
