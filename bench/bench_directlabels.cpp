@@ -111,6 +111,10 @@ bool measure(const Job& job, const QString& root, const char* where)
     std::printf("  page         %.3f s [%.3f-%.3f]\n", g.median, g.min, g.max);
     std::printf("  zint --batch %.3f s [%.3f-%.3f]\n", f.median, f.min, f.max);
     std::printf("  ratio        %.2f [%.2f-%.2f] times zint --batch\n", r.median, r.min, r.max);
+    // One line for scripts (bench/acceptance.sh).
+    std::printf("RESULT bench=directlabels place=%s labels=%d pictures_s=%.3f zint_s=%.3f ratio=%.3f ratio_min=%.3f "
+                "ratio_max=%.3f\n",
+                where, job.labels, p.median, f.median, r.median, r.min, r.max);
     QDir(folder).removeRecursively();
     QDir(batchDir).removeRecursively();
     return true;
@@ -162,5 +166,6 @@ int main(int argc, char** argv)
     rusage usage{};
     getrusage(RUSAGE_SELF, &usage);
     std::printf("peak RSS: %ld MiB\n", usage.ru_maxrss / 1024);
+    std::printf("RESULT bench=directlabels place=all ok=%d rss_kib=%ld\n", ok ? 1 : 0, usage.ru_maxrss);
     return ok ? 0 : 1;
 }

@@ -132,5 +132,9 @@ int main(int argc, char** argv)
     rusage usage{};
     getrusage(RUSAGE_SELF, &usage);
     std::printf("  peak RSS: %ld KiB\n", usage.ru_maxrss);
+    // One line for scripts (bench/acceptance.sh): medians, records per second.
+    std::printf("RESULT bench=labelrun records=%d with_journal_rps=%.0f without_journal_rps=%.0f floor_rps=%.0f "
+                "rss_kib=%ld\n",
+                items, withJournal.median, withoutJournal.median, reading.median, usage.ru_maxrss);
     return 0;
 }

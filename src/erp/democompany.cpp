@@ -6,9 +6,11 @@
 #include <QStringList>
 
 #include <algorithm>
+#include <array>
 #include <cmath>
 #include <initializer_list>
 #include <iterator>
+#include <optional>
 #include <vector>
 
 namespace tagora {
@@ -17,9 +19,12 @@ namespace {
 
 // ---------------------------------------------------------------- the model
 //
-// The company is built once, connection-type neutral: texts in logical order,
-// dates as QDate. Each writer turns a cell into its stored form with
-// storedValue(), so the SQLite file and the script can never drift apart.
+// The company is generated row by row, connection-type neutral: texts in
+// logical order, dates as QDate. Each row goes to a RowSink as soon as it is
+// made, so no table is ever held whole: the SQLite writer inserts it at once,
+// the script writer gathers the rows it prints. Each writer turns a cell into
+// its stored form with storedValue(), so the SQLite file and the script can
+// never drift apart.
 
 enum class Kind { Int, Real, Text, Char, Date };
 
@@ -35,37 +40,48 @@ Column V(const char* name, int width) { return {QLatin1String(name), Kind::Text,
 Column C(const char* name, int width) { return {QLatin1String(name), Kind::Char, width}; }
 Column D(const char* name) { return {QLatin1String(name), Kind::Date}; }
 
+// A table's shape; its rows go to a RowSink.
 struct Table {
     QString name;
     std::vector<Column> columns;
     QStringList key;                  // primary key, empty when rows may repeat
     std::vector<QStringList> indexes; // further, non-unique indexes
-    std::vector<QVariant> cells;      // row after row
-
-    int rowCount() const { return int(cells.size() / columns.size()); }
-    const QVariant& cell(int row, int column) const { return cells[size_t(row) * columns.size() + size_t(column)]; }
-    void add(std::initializer_list<QVariant> row)
-    {
-        Q_ASSERT(row.size() == columns.size());
-        cells.insert(cells.end(), row.begin(), row.end());
-    }
-    void add(const std::vector<QVariant>& row)
-    {
-        Q_ASSERT(row.size() == columns.size());
-        cells.insert(cells.end(), row.begin(), row.end());
-    }
 };
 
-struct Company {
-    std::vector<Table> tables;
+// Where the rows go, table by table (the position in schema()), each row's
+// cells in column order. A sink that fails keeps its first error and takes
+// no more rows.
+class RowSink {
+public:
+    virtual ~RowSink() = default;
+    virtual void add(size_t table, const QVariant* cells, size_t count) = 0;
+    virtual bool failed() const = 0;
+};
 
-    Table& operator[](const char* name)
+// One table of the company as the builder fills it.
+class Rows {
+public:
+    Rows(RowSink& sink, size_t table, size_t width)
+        : m_sink(sink)
+        , m_table(table)
+        , m_width(width)
     {
-        for (Table& t : tables)
-            if (t.name == QLatin1String(name))
-                return t;
-        qFatal("demo company: no table %s", name);
     }
+    void add(std::initializer_list<QVariant> row) const
+    {
+        Q_ASSERT(row.size() == m_width);
+        m_sink.add(m_table, row.begin(), row.size());
+    }
+    void add(const std::vector<QVariant>& row) const
+    {
+        Q_ASSERT(row.size() == m_width);
+        m_sink.add(m_table, row.data(), row.size());
+    }
+
+private:
+    RowSink& m_sink;
+    size_t m_table;
+    size_t m_width;
 };
 
 const QDate kMinuteEpoch(1988, 1, 1);
@@ -100,7 +116,7 @@ std::vector<Table> schema(bool labelLists)
     std::vector<Table> t;
     auto table = [&t](const char* name, std::vector<Column> columns, QStringList key,
                       std::vector<QStringList> indexes = {}) {
-        t.push_back({QLatin1String(name), std::move(columns), std::move(key), std::move(indexes), {}});
+        t.push_back({QLatin1String(name), std::move(columns), std::move(key), std::move(indexes)});
     };
     table("CURRENCIES", {I("CURRENCY"), V("CODE", 3), V("NAME", 24)}, {"CURRENCY"});
     table("UNIT", {I("UNIT"), V("UNITNAME", 8)}, {"UNIT"});
@@ -178,7 +194,9 @@ std::vector<Table> schema(bool labelLists)
 // ------------------------------------------------------------------ helpers
 
 // A fixed sequence (splitmix64), independent of the standard library's
-// distributions, so the content is the same with every compiler.
+// distributions, so the content is the same with every compiler. Its state
+// is a counter, so a sequence can be resumed from a state kept earlier, or
+// taken up any number of draws further on.
 class Random {
 public:
     explicit Random(quint64 seed)
@@ -187,7 +205,7 @@ public:
     }
     quint64 next()
     {
-        quint64 z = (m_state += 0x9E3779B97F4A7C15ULL);
+        quint64 z = (m_state += kStep);
         z = (z ^ (z >> 30)) * 0xBF58476D1CE4E5B9ULL;
         z = (z ^ (z >> 27)) * 0x94D049BB133111EBULL;
         return z ^ (z >> 31);
@@ -198,7 +216,13 @@ public:
     template <typename T>
     const T& pick(const std::vector<T>& v) { return v[size_t(below(int(v.size())))]; }
 
+    // Random(state()) goes on exactly as this one would.
+    quint64 state() const { return m_state; }
+    // As if next() had been called `draws` times.
+    void skip(quint64 draws) { m_state += draws * kStep; }
+
 private:
+    static constexpr quint64 kStep = 0x9E3779B97F4A7C15ULL;
     quint64 m_state;
 };
 
@@ -298,6 +322,13 @@ const std::vector<FamilyDef>& families()
     return f;
 }
 
+// Unit names, by unit number from 1.
+const std::vector<QString>& unitNames()
+{
+    static const auto units = list({"יח'", "ק\"ג", "מטר", "ליטר", "קרטון", "זוג"});
+    return units;
+}
+
 struct Item {
     int id = 0;
     QString key;
@@ -318,19 +349,29 @@ std::pair<QString, QString> splitValue(const QString& v)
     return {v.left(eq), v.mid(eq + 1)};
 }
 
-std::pair<QString, QString> describe(const Pattern& p, Random& rng)
+// The values a pattern's %1 and %2 take (Hebrew, English), split once.
+struct PatternValues {
+    std::vector<std::pair<QString, QString>> a, b;
+};
+
+const std::vector<std::vector<PatternValues>>& patternValues()
 {
-    QString he = u8(p.he);
-    QString en = u8(p.en);
-    for (const auto& [marker, values] : {std::pair{"%1", p.a}, std::pair{"%2", p.b}}) {
-        const QStringList options = u8(values).split(QLatin1Char('|'), Qt::SkipEmptyParts);
-        if (options.isEmpty())
-            continue;
-        const auto [h, e] = splitValue(options[rng.below(int(options.size()))]);
-        he.replace(QLatin1String(marker), h);
-        en.replace(QLatin1String(marker), e);
-    }
-    return {he, en};
+    static const std::vector<std::vector<PatternValues>> all = [] {
+        auto split = [](const char* values) {
+            std::vector<std::pair<QString, QString>> out;
+            for (const QString& v : u8(values).split(QLatin1Char('|'), Qt::SkipEmptyParts))
+                out.push_back(splitValue(v));
+            return out;
+        };
+        std::vector<std::vector<PatternValues>> out;
+        for (const FamilyDef& f : families()) {
+            out.emplace_back();
+            for (const Pattern& p : f.patterns)
+                out.back().push_back({split(p.a), split(p.b)});
+        }
+        return out;
+    }();
+    return all;
 }
 
 long long basePrice(Random& rng)
@@ -347,34 +388,203 @@ QString barcodeFor(int serial)
     return ean13(QStringLiteral("7290%1").arg(10000000 + serial, 8, 10, QLatin1Char('0')));
 }
 
+// The items of types R and P, made on demand instead of kept: item i is
+// drawn again from the sequence's state before it. The draws of every item
+// are taken once at the start, keeping the state every kStride items, so
+// reaching any item draws at most kStride others (only the choices, no
+// text), and walking them in order draws each once.
+//
+// The sequence (seed 0x1001) is, in order: for each item its family (but for
+// the first six), pattern, %1 and %2 values, base price, type and foreign
+// name kind; then one draw an item for its barcode; then three a service item
+// for its price.
+class ItemSource {
+public:
+    explicit ItemSource(int count)
+        : m_count(count)
+        , m_rng(kSeed)
+    {
+        m_marks.reserve(size_t(count / kStride + 1));
+        Random rng(kSeed);
+        for (int i = 0; i < count; ++i) {
+            if (i % kStride == 0)
+                m_marks.push_back(rng.state());
+            draw(i, rng);
+        }
+        m_afterDraws = rng.state();
+    }
+
+    int count() const { return m_count; }
+    // Services and the like, numbered after the items.
+    int otherCount() const { return 3 + m_count / 200; }
+
+    Item item(int i)
+    {
+        static const char* const odd[] = {"AB\"12", "O'R-5", " LEAD-7", "TRAIL-8 ", "   ", "MK-482"};
+        const Draw d = drawAt(i);
+        const FamilyDef& f = families()[size_t(d.family)];
+        const Pattern& p = f.patterns[size_t(d.pattern)];
+        const PatternValues& values = patternValues()[size_t(d.family)][size_t(d.pattern)];
+        QString he = u8(p.he);
+        QString en = u8(p.en);
+        if (d.a >= 0) {
+            he.replace(QLatin1String("%1"), values.a[size_t(d.a)].first);
+            en.replace(QLatin1String("%1"), values.a[size_t(d.a)].second);
+        }
+        if (d.b >= 0) {
+            he.replace(QLatin1String("%2"), values.b[size_t(d.b)].first);
+            en.replace(QLatin1String("%2"), values.b[size_t(d.b)].second);
+        }
+        Item it;
+        it.id = i + 1;
+        it.key = QStringLiteral("%1-%2").arg(QLatin1String(f.prefix)).arg(1000 + i);
+        it.des = he;
+        it.edes = en;
+        it.family = f.id;
+        it.unit = p.unit;
+        it.cents = d.cents;
+        // The keys readers trip over come first: quotes, blanks around the
+        // key, a key that is nothing but blanks, a description without Hebrew.
+        if (i < 6) {
+            it.key = u8(odd[i]);
+            if (i == 1) {
+                it.type = u'P';
+                it.des = u8("בורג M6 (נירוסטה) 20 מ\"מ");
+                it.family = 1;
+                it.unit = 1;
+                it.edes = u8(""); // a foreign name left empty
+            } else if (i == 2) {
+                it.edes = kNull;
+            } else if (i == 5) {
+                it.des = u8("Makita DHP482 (18V)");
+                it.edes = u8("Makita DHP482 (18V)");
+                it.family = 3;
+                it.unit = 1;
+            }
+        } else {
+            if (d.typeP)
+                it.type = u'P';
+            if (d.foreignName < 8)
+                it.edes = kNull;
+            else if (d.foreignName < 12)
+                it.edes = u8("");
+        }
+        Random rng(m_afterDraws);
+        rng.skip(quint64(i));
+        const int r = rng.below(100);
+        if (i == 3 || (i > 5 && r < 7))
+            it.barcode = kNull;
+        else if (i == 5 || (i > 5 && r < 10))
+            it.barcode = u8("");
+        else
+            it.barcode = barcodeFor(i + 1);
+        return it;
+    }
+
+    long long cents(int i) { return drawAt(i).cents; }
+
+    // Items the readers must leave out: services and the like.
+    Item other(int j) const
+    {
+        static const auto services = list({"שירותי הובלה", "התקנה באתר", "אחריות מורחבת 3 שנים", "דמי טיפול", "פיקדון משטח"});
+        Random rng(m_afterDraws);
+        rng.skip(quint64(m_count) + 3 * quint64(j));
+        Item it;
+        it.id = m_count + j + 1;
+        it.key = QStringLiteral("SRV-%1").arg(10 + j);
+        it.des = services[size_t(j) % services.size()];
+        it.edes = QStringLiteral("Service %1").arg(10 + j);
+        it.family = 8;
+        it.unit = 1;
+        it.barcode = kNull;
+        it.type = j % 3 == 2 ? u'S' : u'O';
+        it.cents = basePrice(rng);
+        return it;
+    }
+
+private:
+    static constexpr quint64 kSeed = 0x1001;
+    static constexpr int kStride = 256;
+
+    // An item's choices, without its texts.
+    struct Draw {
+        int family = 0;  // index into families()
+        int pattern = 0; // index into its patterns
+        int a = -1, b = -1; // the values of %1 and %2, -1 for none
+        long long cents = 0;
+        bool typeP = false;
+        int foreignName = 100; // below 8 none, below 12 empty
+    };
+
+    static Draw draw(int i, Random& rng)
+    {
+        Draw d;
+        d.family = i < 6 ? i % 7 : rng.below(7);
+        const FamilyDef& f = families()[size_t(d.family)];
+        d.pattern = rng.below(int(f.patterns.size()));
+        const PatternValues& values = patternValues()[size_t(d.family)][size_t(d.pattern)];
+        if (!values.a.empty())
+            d.a = rng.below(int(values.a.size()));
+        if (!values.b.empty())
+            d.b = rng.below(int(values.b.size()));
+        d.cents = basePrice(rng);
+        if (i >= 6) {
+            d.typeP = rng.chance(35);
+            d.foreignName = rng.below(100);
+        }
+        return d;
+    }
+
+    // Item i's draw, from the cursor when it is near, else from the mark before i.
+    Draw drawAt(int i)
+    {
+        Q_ASSERT(i >= 0 && i < m_count);
+        if (i < m_next || i - m_next >= kStride) {
+            m_rng = Random(m_marks[size_t(i / kStride)]);
+            m_next = i / kStride * kStride;
+        }
+        while (m_next < i)
+            draw(m_next++, m_rng);
+        ++m_next;
+        return draw(i, m_rng);
+    }
+
+    const int m_count;
+    std::vector<quint64> m_marks; // the state before item k * kStride
+    quint64 m_afterDraws = 0;     // the state after the last item's draws
+    Random m_rng;                 // the cursor: the state before item m_next
+    int m_next = 0;
+};
+
 // ------------------------------------------------------------------ builder
 
 class Builder {
 public:
-    explicit Builder(const DemoOptions& options)
+    Builder(const DemoOptions& options, const std::vector<Table>& tables, RowSink& sink)
         : m_options(options)
         , m_today(options.today.isValid() ? options.today : QDate(2024, 1, 1))
         , m_itemCount(std::max(options.items, 10))
+        , m_tables(tables)
+        , m_sink(sink)
+        , m_items(m_itemCount)
     {
-        m_company.tables = schema(options.labelLists);
     }
 
-    Company build()
+    // Sends every row to the sink as it is made: each table's rows in their
+    // order, the tables interleaved. Stops early when the sink fails.
+    void build()
     {
-        referenceTables();
-        items();
-        accounts();
-        itemTables();
-        alternateKeys();
-        specialPrices();
-        orders();
-        purchaseOrders();
-        stockDocuments();
-        invoices();
-        itemCards();
-        if (m_options.labelLists)
+        void (Builder::*const steps[])() = {&Builder::referenceTables, &Builder::accounts, &Builder::itemTables,
+                                            &Builder::alternateKeys, &Builder::specialPrices, &Builder::orders,
+                                            &Builder::purchaseOrders, &Builder::stockDocuments, &Builder::invoices,
+                                            &Builder::itemCards};
+        for (auto step : steps) {
+            if (m_sink.failed())
+                return;
+            (this->*step)();
+        }
+        if (m_options.labelLists && !m_sink.failed())
             labelLists();
-        return std::move(m_company);
     }
 
 private:
@@ -383,33 +593,41 @@ private:
 
     QDate day(int offset) const { return m_today.addDays(offset); }
 
-    // Document lines pick items with a usable key.
-    const Item& lineItem(Random& rng) const
+    Rows rows(const char* name) const
+    {
+        for (size_t i = 0; i < m_tables.size(); ++i)
+            if (m_tables[i].name == QLatin1String(name))
+                return Rows(m_sink, i, m_tables[i].columns.size());
+        qFatal("demo company: no table %s", name);
+    }
+
+    // Document lines pick items with a usable key: the item's index.
+    int lineItem(Random& rng) const
     {
         int i = rng.below(m_itemCount - 1);
         if (i >= kBlankKey)
             ++i;
-        return m_items[size_t(i)];
+        return i;
     }
 
     void referenceTables()
     {
-        Table& cur = m_company["CURRENCIES"];
+        const Rows cur = rows("CURRENCIES");
         cur.add({Shekel, u8("ש\"ח"), u8("שקל חדש")});
         cur.add({Dollar, u8("$"), u8("דולר ארה\"ב")});
         cur.add({Euro, u8("EUR"), u8("אירו")});
         cur.add({NoCode, u8(""), u8("מטבע ללא קוד")});
 
-        Table& unit = m_company["UNIT"];
-        const auto units = list({"יח'", "ק\"ג", "מטר", "ליטר", "קרטון", "זוג"});
+        const Rows unit = rows("UNIT");
+        const auto& units = unitNames();
         for (size_t i = 0; i < units.size(); ++i)
             unit.add({int(i + 1), units[i]});
 
-        Table& fam = m_company["FAMILY"];
+        const Rows fam = rows("FAMILY");
         for (const FamilyDef& f : families())
             fam.add({f.id, u8(f.name), u8(f.des)});
 
-        Table& wh = m_company["WAREHOUSES"];
+        const Rows wh = rows("WAREHOUSES");
         wh.add({1, u8("MAIN"), u8("A-01")});
         wh.add({2, u8("STR2"), u8("B-12")});
         wh.add({3, u8("SHOP"), u8("חנות")});
@@ -417,91 +635,13 @@ private:
 
         // 0 and -50 are not real lists; list 0 has neither name nor
         // description, which is how "no price list" reaches the user.
-        Table& pl = m_company["PRICELIST"];
+        const Rows pl = rows("PRICELIST");
         pl.add({0, u8(""), u8("")});
         pl.add({1, u8("BAS"), u8("מחירון בסיס")});
         pl.add({2, u8("WHS"), u8("סיטונאי")});
         pl.add({3, u8("USD"), u8("מחירון יצוא ($)")});
         pl.add({4, u8("מבצעים"), u8("")});
         pl.add({-50, u8("LPP"), u8("מחיר קנייה אחרון")});
-    }
-
-    void items()
-    {
-        Random rng(0x1001);
-        const auto& fams = families();
-        auto generated = [&](int index, int familyIndex) {
-            const FamilyDef& f = fams[size_t(familyIndex)];
-            const Pattern& p = f.patterns[size_t(rng.below(int(f.patterns.size())))];
-            const auto [he, en] = describe(p, rng);
-            Item it;
-            it.key = QStringLiteral("%1-%2").arg(QLatin1String(f.prefix)).arg(1000 + index);
-            it.des = he;
-            it.edes = en;
-            it.family = f.id;
-            it.unit = p.unit;
-            it.cents = basePrice(rng);
-            return it;
-        };
-
-        // The keys readers trip over come first: quotes, blanks around the
-        // key, a key that is nothing but blanks, a description without Hebrew.
-        const char* odd[] = {"AB\"12", "O'R-5", " LEAD-7", "TRAIL-8 ", "   ", "MK-482"};
-        for (int i = 0; i < 6; ++i) {
-            Item it = generated(i, i % 7);
-            it.key = u8(odd[i]);
-            m_items.push_back(it);
-        }
-        m_items[1].type = u'P';
-        m_items[1].des = u8("בורג M6 (נירוסטה) 20 מ\"מ");
-        m_items[1].family = 1;
-        m_items[1].unit = 1;
-        m_items[1].edes = u8(""); // a foreign name left empty
-        m_items[2].edes = kNull;
-        m_items[3].barcode = kNull;
-        m_items[5].des = u8("Makita DHP482 (18V)");
-        m_items[5].edes = u8("Makita DHP482 (18V)");
-        m_items[5].family = 3;
-        m_items[5].unit = 1;
-        for (int i = 6; i < m_itemCount; ++i) {
-            Item it = generated(i, rng.below(7));
-            if (rng.chance(35))
-                it.type = u'P';
-            const int r = rng.below(100);
-            if (r < 8)
-                it.edes = kNull;
-            else if (r < 12)
-                it.edes = u8("");
-            m_items.push_back(it);
-        }
-        for (int i = 0; i < m_itemCount; ++i) {
-            Item& it = m_items[size_t(i)];
-            it.id = i + 1;
-            const int r = rng.below(100);
-            if (i == 3 || (i > 5 && r < 7))
-                it.barcode = kNull;
-            else if (i == 5 || (i > 5 && r < 10))
-                it.barcode = u8("");
-            else
-                it.barcode = barcodeFor(i + 1);
-        }
-
-        // Items the readers must leave out: services and the like.
-        const auto services = list({"שירותי הובלה", "התקנה באתר", "אחריות מורחבת 3 שנים", "דמי טיפול", "פיקדון משטח"});
-        const int extra = 3 + m_itemCount / 200;
-        for (int i = 0; i < extra; ++i) {
-            Item it;
-            it.id = m_itemCount + i + 1;
-            it.key = QStringLiteral("SRV-%1").arg(10 + i);
-            it.des = services[size_t(i) % services.size()];
-            it.edes = QStringLiteral("Service %1").arg(10 + i);
-            it.family = 8;
-            it.unit = 1;
-            it.barcode = kNull;
-            it.type = i % 3 == 2 ? u'S' : u'O';
-            it.cents = basePrice(rng);
-            m_others.push_back(it);
-        }
     }
 
     void accounts()
@@ -534,16 +674,15 @@ private:
             return QStringLiteral("%1-%2").arg(QLatin1String(areas[rng.below(8)])).arg(rng.between(2000000, 9999999));
         };
 
-        Table& cust = m_company["CUSTOMERS"];
-        int id = 1;
+        const Rows cust = rows("CUSTOMERS");
+        // Customer ids run from 1, in the order they are added.
         auto addCustomer = [&](const QString& key, const QString& des, int mcust) {
-            Customer c{id++, key, mcust};
-            cust.add({c.id, key, des, address(), phone(), mcust ? mcust : c.id});
-            m_customers.push_back(c);
+            const int id = ++m_customerCount;
+            cust.add({id, key, des, address(), phone(), mcust ? mcust : id});
         };
         // A chain whose branches are consolidated under the head office.
         addCustomer(u8("CH-100"), u8("רשת השקמה - מטה"), 0);
-        const int head = m_customers.back().id;
+        const int head = m_customerCount;
         addCustomer(u8("CH-101"), u8("רשת השקמה - סניף חיפה"), head);
         addCustomer(u8("CH-102"), u8("רשת השקמה - סניף באר שבע"), head);
         addCustomer(u8("SHIRAN'S"), u8("שירן'ס קייטרינג"), 0);
@@ -558,14 +697,15 @@ private:
             addCustomer(QString::number(10001 + i), des, 0);
         }
 
-        Table& sup = m_company["SUPPLIERS"];
-        auto addSupplier = [&](const QString& key, const QString& des) {
-            sup.add({int(m_suppliers.size() + 1), key, des, address(), phone()});
-            m_suppliers.push_back(key);
+        const Rows sup = rows("SUPPLIERS");
+        // Supplier ids run from 1, in the order they are added; supplierKey() gives their keys.
+        auto addSupplier = [&](const QString& des) {
+            const int id = ++m_supplierCount;
+            sup.add({id, supplierKey(id), des, address(), phone()});
         };
-        addSupplier(u8("D'OR-1"), u8("ד'אור יבוא (1998) בע\"מ"));
-        addSupplier(u8("M\"T-2"), u8("מ.ת. אלקטרו-טק בע\"מ"));
-        addSupplier(u8("GTL"), u8("Global Tools Ltd"));
+        addSupplier(u8("ד'אור יבוא (1998) בע\"מ"));
+        addSupplier(u8("מ.ת. אלקטרו-טק בע\"מ"));
+        addSupplier(u8("Global Tools Ltd"));
         const int generatedSuppliers = 4 + m_itemCount / 200;
         for (int i = 0; i < generatedSuppliers; ++i) {
             const QString des = QStringLiteral("%1 %2 %3")
@@ -573,18 +713,34 @@ private:
                                     .arg(rng.pick(supTrades))
                                     .arg(rng.pick(suffixes))
                                     .trimmed();
-            addSupplier(QString::number(50001 + i), des);
+            addSupplier(des);
         }
+    }
+
+    // The supplier's key by its id.
+    static QString supplierKey(int id)
+    {
+        static const char* const fixed[] = {"D'OR-1", "M\"T-2", "GTL"};
+        return id <= 3 ? u8(fixed[id - 1]) : QString::number(50001 + id - 4);
+    }
+
+    // Draws of the item tables (seed 0x3003): two for each item's PARTPARAM
+    // row (warehouse, supplier), items first, then the others; then the prices.
+    int itemSupplier(int index) const
+    {
+        Random rng(0x3003);
+        rng.skip(2 * quint64(index) + 1);
+        return rng.between(1, m_supplierCount);
     }
 
     void itemTables()
     {
         Random rng(0x3003);
-        Table& part = m_company["PART"];
-        Table& des = m_company["PARTDES"];
-        Table& param = m_company["PARTPARAM"];
-        Table& price = m_company["PARTPRICE"];
-        const int supplierCount = int(m_suppliers.size());
+        const Rows part = rows("PART");
+        const Rows des = rows("PARTDES");
+        const Rows param = rows("PARTPARAM");
+        const Rows price = rows("PARTPRICE");
+        const int supplierCount = m_supplierCount;
 
         auto addItem = [&](const Item& it) {
             const FamilyDef& f = families()[size_t(it.family - 1)];
@@ -592,99 +748,99 @@ private:
             des.add({it.id, it.edes});
             param.add({it.id, rng.between(1, 4), rng.between(1, supplierCount)});
         };
-        for (const Item& it : m_items)
-            addItem(it);
-        for (const Item& it : m_others)
-            addItem(it);
+        for (int i = 0; i < m_itemCount; ++i)
+            addItem(m_items.item(i));
+        for (int j = 0; j < m_items.otherCount(); ++j)
+            addItem(m_items.other(j));
 
-        auto addPrice = [&](const Item& it, int plist, QVariant amount, int currency, double quant = 0) {
-            price.add({it.id, plist, quant, amount, currency});
+        auto addPrice = [&](int id, int plist, QVariant amount, int currency, double quant = 0) {
+            price.add({id, plist, quant, amount, currency});
         };
         for (int i = 0; i < m_itemCount; ++i) {
-            const Item& it = m_items[size_t(i)];
-            const double base = money(it.cents);
+            const int id = i + 1;
+            const double base = money(m_items.cents(i));
             const bool odd = i < 6; // the odd items are priced in every list
             if (odd || rng.chance(92))
-                addPrice(it, 1, base, Shekel);
+                addPrice(id, 1, base, Shekel);
             if (i == 1) // a quantity break: the same list prices the item twice
-                addPrice(it, 1, roundedMoney(base * 0.9), Shekel, 100);
+                addPrice(id, 1, roundedMoney(base * 0.9), Shekel, 100);
             if (i == 2)
-                addPrice(it, 2, kNull, Shekel);
+                addPrice(id, 2, kNull, Shekel);
             else if (odd || rng.chance(60))
-                addPrice(it, 2, roundedMoney(base * 0.85), Shekel);
+                addPrice(id, 2, roundedMoney(base * 0.85), Shekel);
             if (odd || rng.chance(40))
-                addPrice(it, 3, roundedMoney(base / 3.7), Dollar);
+                addPrice(id, 3, roundedMoney(base / 3.7), Dollar);
             if (i == 0 || (!odd && rng.chance(15)))
-                addPrice(it, 4, roundedMoney(base * 0.8), i == 0 || rng.chance(10) ? NoCode : Shekel);
+                addPrice(id, 4, roundedMoney(base * 0.8), i == 0 || rng.chance(10) ? NoCode : Shekel);
             if (i == 0 || rng.chance(4))
-                addPrice(it, 0, base, Shekel);
+                addPrice(id, 0, base, Shekel);
             if (i < 2 || rng.chance(25))
-                addPrice(it, -50, roundedMoney(base * 0.55), rng.chance(20) ? Euro : Shekel);
+                addPrice(id, -50, roundedMoney(base * 0.55), rng.chance(20) ? Euro : Shekel);
         }
-        for (const Item& it : m_others)
-            addPrice(it, 1, money(it.cents), Shekel);
+        for (int j = 0; j < m_items.otherCount(); ++j) {
+            const Item it = m_items.other(j);
+            addPrice(it.id, 1, money(it.cents), Shekel);
+        }
     }
 
     void alternateKeys()
     {
         Random rng(0x4004);
-        Table& cp = m_company["CUSTPART"];
-        for (const Customer& c : m_customers) {
+        const Rows cp = rows("CUSTPART");
+        for (int id = 1; id <= m_customerCount; ++id) {
             const int n = rng.between(1, 4);
             for (int k = 0; k < n; ++k)
-                cp.add({c.id, lineItem(rng).id, QStringLiteral("K-%1").arg(rng.between(1000, 99999))});
+                cp.add({id, lineItem(rng) + 1, QStringLiteral("K-%1").arg(rng.between(1000, 99999))});
         }
         // The same customer and item twice, an empty and a missing number,
-        // and numbers with quotes.
-        cp.add({m_customers[0].id, m_items[0].id, u8("CH/77-1")});
-        cp.add({m_customers[0].id, m_items[0].id, u8("CH/77-2")});
-        cp.add({m_customers[3].id, m_items[1].id, u8("")});
-        cp.add({m_customers[3].id, m_items[6].id, kNull});
-        cp.add({m_customers[4].id, m_items[1].id, u8("X'12")});
-        cp.add({m_customers[4].id, m_items[0].id, u8("Q\"7")});
+        // and numbers with quotes (customer and item ids).
+        cp.add({1, 1, u8("CH/77-1")});
+        cp.add({1, 1, u8("CH/77-2")});
+        cp.add({4, 2, u8("")});
+        cp.add({4, 7, kNull});
+        cp.add({5, 2, u8("X'12")});
+        cp.add({5, 1, u8("Q\"7")});
 
-        Table& sp = m_company["SUPPART"];
-        const Table& param = m_company["PARTPARAM"];
+        const Rows sp = rows("SUPPART");
         for (int i = 0; i < m_itemCount; ++i) {
             if (i == kBlankKey || !rng.chance(45))
                 continue;
-            const int sup = param.cell(i, 2).toInt();
-            sp.add({sup, m_items[size_t(i)].id,
-                    QStringLiteral("%1-%2").arg(m_suppliers[size_t(sup - 1)]).arg(rng.between(100, 9999))});
+            const int sup = itemSupplier(i);
+            sp.add({sup, i + 1, QStringLiteral("%1-%2").arg(supplierKey(sup)).arg(rng.between(100, 9999))});
         }
-        sp.add({1, m_items[0].id, u8("DOR-A1")});
-        sp.add({1, m_items[0].id, u8("DOR-A2")});
-        sp.add({2, m_items[1].id, u8("")});
-        sp.add({3, m_items[5].id, u8("DHP482Z")});
+        sp.add({1, 1, u8("DOR-A1")});
+        sp.add({1, 1, u8("DOR-A2")});
+        sp.add({2, 2, u8("")});
+        sp.add({3, 6, u8("DHP482Z")});
     }
 
     void specialPrices()
     {
         Random rng(0x5005);
-        Table& cpp = m_company["CUSTPARTPRICE"];
-        auto add = [&](int cust, const Item& it, int currency, int from, int till) {
-            const double amount = roundedMoney(money(it.cents) * (0.7 + rng.below(25) / 100.0));
-            cpp.add({cust, it.id, currency == Dollar ? roundedMoney(amount / 3.7) : amount, currency, day(from),
+        const Rows cpp = rows("CUSTPARTPRICE");
+        auto add = [&](int cust, int item, int currency, int from, int till) {
+            const double amount = roundedMoney(money(m_items.cents(item)) * (0.7 + rng.below(25) / 100.0));
+            cpp.add({cust, item + 1, currency == Dollar ? roundedMoney(amount / 3.7) : amount, currency, day(from),
                      day(till)});
         };
-        // One of each kind of validity around today.
-        const int head = m_customers[0].id;
-        add(head, m_items[0], Shekel, -30, 60);  // valid
-        add(head, m_items[0], Shekel, -10, 90);  // the same customer and item again, also valid
-        add(head, m_items[1], Shekel, -10, 0);   // ends today
-        add(head, m_items[2], Shekel, 0, 30);    // starts today
-        add(head, m_items[3], Shekel, 1, 90);    // starts tomorrow
-        add(head, m_items[5], Shekel, -90, -1);  // ended yesterday
-        add(head, m_items[6], NoCode, -5, 25);   // currency without a code
-        add(m_customers[4].id, m_items[1], Dollar, -365, 365);
-        add(m_customers[1].id, m_items[6], Shekel, -20, 40);
-        for (size_t c = 5; c < m_customers.size(); ++c) {
+        // One of each kind of validity around today (customer ids, item indexes).
+        const int head = 1;
+        add(head, 0, Shekel, -30, 60);  // valid
+        add(head, 0, Shekel, -10, 90);  // the same customer and item again, also valid
+        add(head, 1, Shekel, -10, 0);   // ends today
+        add(head, 2, Shekel, 0, 30);    // starts today
+        add(head, 3, Shekel, 1, 90);    // starts tomorrow
+        add(head, 5, Shekel, -90, -1);  // ended yesterday
+        add(head, 6, NoCode, -5, 25);   // currency without a code
+        add(5, 1, Dollar, -365, 365);
+        add(2, 6, Shekel, -20, 40);
+        for (int c = 5; c < m_customerCount; ++c) {
             if (!rng.chance(50))
                 continue;
             const int n = rng.between(1, 3);
             for (int k = 0; k < n; ++k) {
                 // Mostly valid now; some ended, some end today, some not yet begun.
-                const Item& it = lineItem(rng);
+                const int it = lineItem(rng);
                 const int currency = rng.chance(15) ? Dollar : Shekel;
                 const int kind = rng.below(10);
                 int from = -rng.between(0, 120);
@@ -698,7 +854,7 @@ private:
                     from = rng.between(1, 30);
                     till = from + rng.between(30, 90);
                 }
-                add(m_customers[c].id, it, currency, from, till);
+                add(c + 1, it, currency, from, till);
             }
         }
     }
@@ -721,7 +877,7 @@ private:
         std::vector<DocLine> out;
         for (int k = 0; k < n; ++k) {
             DocLine l;
-            l.part = lineItem(rng).id;
+            l.part = lineItem(rng) + 1;
             const int r = rng.below(100);
             if (lineCounter < int(std::size(forced)))
                 l.quant = forced[lineCounter];
@@ -778,20 +934,44 @@ private:
         return QStringLiteral("PO-%1").arg(rng.between(1000, 99999));
     }
 
-    // Document dates spread over the last three months, in id order.
-    std::vector<QDate> docDates(Random& rng, int count)
-    {
-        std::vector<int> offsets;
-        for (int i = 0; i < count; ++i)
-            offsets.push_back(-rng.between(0, 89));
-        std::sort(offsets.begin(), offsets.end());
-        if (!offsets.empty())
-            offsets.back() = 0;
-        std::vector<QDate> out;
-        for (int o : offsets)
-            out.push_back(day(o));
-        return out;
-    }
+    // Document dates spread over the last three months, in id order: count
+    // days back drawn at once, handed out from the earliest, the last one
+    // today. Kept as a count a day, not a list of dates.
+    class DocDates {
+    public:
+        DocDates(Random& rng, int count, const QDate& today)
+            : m_today(today)
+        {
+            for (int i = 0; i < count; ++i)
+                ++m_left[size_t(rng.between(0, 89))];
+            // The latest date drawn becomes today.
+            for (size_t back = 0; back < m_left.size(); ++back)
+                if (m_left[back] > 0) {
+                    --m_left[back];
+                    ++m_left[0];
+                    break;
+                }
+        }
+        bool done()
+        {
+            while (m_back >= 0 && m_left[size_t(m_back)] == 0)
+                --m_back;
+            return m_back < 0;
+        }
+        // The next date; not after done().
+        QDate peek() { return done() ? QDate() : m_today.addDays(-m_back); }
+        QDate next()
+        {
+            const QDate d = peek();
+            --m_left[size_t(m_back)];
+            return d;
+        }
+
+    private:
+        QDate m_today;
+        std::array<int, 90> m_left{}; // documents left, by days back
+        int m_back = 89;
+    };
 
     QString docNumber(const char* prefix, const QDate& date, int& counter)
     {
@@ -806,15 +986,15 @@ private:
     int customerFor(Random& rng, int docIndex)
     {
         if (docIndex >= 1 && docIndex <= 3)
-            return m_customers[size_t(docIndex == 3 ? 4 : docIndex)].id;
-        return m_customers[size_t(rng.below(int(m_customers.size())))].id;
+            return docIndex == 3 ? 5 : docIndex + 1;
+        return rng.below(m_customerCount) + 1;
     }
 
     int supplierFor(Random& rng, int docIndex)
     {
         if (docIndex < 2)
             return docIndex + 1;
-        return rng.between(1, int(m_suppliers.size()));
+        return rng.between(1, m_supplierCount);
     }
 
     QVariant finalFlag(Random& rng, int docIndex)
@@ -833,22 +1013,22 @@ private:
     {
         if (docIndex != 0)
             return;
-        lines.push_back({m_items[kBlankKey].id, 3, kNull, 1});
-        lines.push_back({m_others[0].id, 1, kNull, -1});
+        lines.push_back({kBlankKey + 1, 3, kNull, 1});
+        lines.push_back({m_itemCount + 1, 1, kNull, -1}); // the first service item
     }
 
     void orders()
     {
         Random rng(0x6006);
-        Table& head = m_company["ORDERS"];
-        Table& lines = m_company["ORDERITEMS"];
-        Table& ext = m_company["ORDERITEMSA"];
-        const auto dates = docDates(rng, 8 + m_itemCount / 40);
+        const Rows head = rows("ORDERS");
+        const Rows lines = rows("ORDERITEMS");
+        const Rows ext = rows("ORDERITEMSA");
+        DocDates dates(rng, 8 + m_itemCount / 40, m_today);
         int number = 0, ordi = 0, lineCounter = 0;
-        for (int d = 0; d < int(dates.size()); ++d) {
+        for (int d = 0; !dates.done(); ++d) {
             const int ord = 1001 + d;
-            head.add({ord, docNumber("SO", dates[size_t(d)], number), customerFor(rng, d), dates[size_t(d)],
-                      reference(rng), details(rng)});
+            const QDate date = dates.next();
+            head.add({ord, docNumber("SO", date, number), customerFor(rng, d), date, reference(rng), details(rng)});
             auto ls = docLines(rng, d, lineCounter);
             oddLines(ls, d);
             for (size_t k = 0; k < ls.size(); ++k) {
@@ -864,15 +1044,15 @@ private:
     void purchaseOrders()
     {
         Random rng(0x7007);
-        Table& head = m_company["PORDERS"];
-        Table& lines = m_company["PORDERITEMS"];
-        Table& ext = m_company["PORDERITEMSA"];
-        const auto dates = docDates(rng, 5 + m_itemCount / 100);
+        const Rows head = rows("PORDERS");
+        const Rows lines = rows("PORDERITEMS");
+        const Rows ext = rows("PORDERITEMSA");
+        DocDates dates(rng, 5 + m_itemCount / 100, m_today);
         int number = 0, ordi = 0, lineCounter = 0;
-        for (int d = 0; d < int(dates.size()); ++d) {
+        for (int d = 0; !dates.done(); ++d) {
             const int ord = 501 + d;
-            head.add({ord, docNumber("PO", dates[size_t(d)], number), supplierFor(rng, d), dates[size_t(d)],
-                      reference(rng), details(rng)});
+            const QDate date = dates.next();
+            head.add({ord, docNumber("PO", date, number), supplierFor(rng, d), date, reference(rng), details(rng)});
             auto ls = docLines(rng, d, lineCounter);
             for (size_t k = 0; k < ls.size(); ++k) {
                 ++ordi;
@@ -886,8 +1066,8 @@ private:
     void stockDocuments()
     {
         Random rng(0x8008);
-        Table& head = m_company["DOCUMENTS"];
-        Table& lines = m_company["TRANSORDER"];
+        const Rows head = rows("DOCUMENTS");
+        const Rows lines = rows("TRANSORDER");
         // Delivery notes, goods receipts, warehouse transfers, and customer
         // returns, which no document type reads.
         struct Kind {
@@ -904,20 +1084,29 @@ private:
             int kind;
             int index;
         };
-        std::vector<Pending> pending;
-        for (int k = 0; k < 4; ++k) {
-            const auto dates = docDates(rng, kinds[k].count);
-            for (int i = 0; i < kinds[k].count; ++i)
-                pending.push_back({dates[size_t(i)], k, i});
-        }
-        std::stable_sort(pending.begin(), pending.end(),
-                         [](const Pending& a, const Pending& b) { return a.date < b.date; });
+        // The four kinds' dates, all drawn first; the documents in date
+        // order, the kinds in the order above on the same day (a stable sort
+        // of the four lists one after another).
+        std::vector<DocDates> dates;
+        for (int k = 0; k < 4; ++k)
+            dates.emplace_back(rng, kinds[k].count, m_today);
+        int indexes[4] = {0, 0, 0, 0};
+        auto nextPending = [&]() -> std::optional<Pending> {
+            int first = -1;
+            for (int k = 0; k < 4; ++k)
+                if (!dates[size_t(k)].done() && (first < 0 || dates[size_t(k)].peek() < dates[size_t(first)].peek()))
+                    first = k;
+            if (first < 0)
+                return std::nullopt;
+            return Pending{dates[size_t(first)].next(), first, indexes[first]++};
+        };
         int numbers[4] = {0, 0, 0, 0};
         int lineCounter[4] = {0, 0, 0, 0};
-        for (size_t d = 0; d < pending.size(); ++d) {
-            const Pending& p = pending[d];
+        int d = 0;
+        for (std::optional<Pending> next; (next = nextPending()); ++d) {
+            const Pending& p = *next;
             const Kind& kind = kinds[p.kind];
-            const int doc = int(d) + 1;
+            const int doc = d + 1;
             int cust = 0, sup = 0;
             if (kind.type == 'D' || kind.type == 'C')
                 cust = customerFor(rng, p.index);
@@ -932,15 +1121,15 @@ private:
                 lines.add({++m_trans, doc, int(k + 1), ls[k].part, ls[k].quant, ls[k].tquant,
                            ls[k].packs >= 0 ? QVariant(ls[k].packs) : kNull});
         }
-        m_lastDoc = int(pending.size());
+        m_lastDoc = d;
     }
 
     void invoices()
     {
         Random rng(0x9009);
-        Table& head = m_company["INVOICES"];
-        Table& lines = m_company["INVOICEITEMS"];
-        Table& packs = m_company["TRANSORDER"];
+        const Rows head = rows("INVOICES");
+        const Rows lines = rows("INVOICEITEMS");
+        const Rows packs = rows("TRANSORDER");
         // Invoice ids start above every stock document id, so package rows
         // keyed by invoice never meet the lines of a stock document.
         const int firstIv = (m_lastDoc / 100000 + 1) * 100000 + 1;
@@ -952,11 +1141,12 @@ private:
         const Kind kinds[] = {{'A', "IN", 8 + m_itemCount / 40}, {'C', "IC", 2 + m_itemCount / 400}};
         int iv = firstIv, kline = 0;
         for (const Kind& kind : kinds) {
-            const auto dates = docDates(rng, kind.count);
+            DocDates dates(rng, kind.count, m_today);
             int number = 0, lineCounter = 0;
             for (int d = 0; d < kind.count; ++d, ++iv) {
-                head.add({iv, docNumber(kind.prefix, dates[size_t(d)], number), QString(QLatin1Char(kind.type)),
-                          customerFor(rng, d), dates[size_t(d)], reference(rng), details(rng), finalFlag(rng, d)});
+                const QDate date = dates.next();
+                head.add({iv, docNumber(kind.prefix, date, number), QString(QLatin1Char(kind.type)),
+                          customerFor(rng, d), date, reference(rng), details(rng), finalFlag(rng, d)});
                 auto ls = docLines(rng, d, lineCounter);
                 if (kind.type == 'A')
                     oddLines(ls, d);
@@ -974,39 +1164,38 @@ private:
     void itemCards()
     {
         Random rng(0xA00A);
-        Table& files = m_company["PARTEXTFILE"];
-        Table& specTypes = m_company["PARTSPECTYPES"];
-        Table& partSpecs = m_company["PARTSPEC"];
-        Table& text = m_company["PARTTEXT"];
-        Table& textLang = m_company["PARTTEXTLANG"];
-        Table& alt = m_company["PARTALT"];
-        Table& arc = m_company["PARTARC"];
+        const Rows files = rows("PARTEXTFILE");
+        const Rows specTypes = rows("PARTSPECTYPES");
+        const Rows partSpecs = rows("PARTSPEC");
+        const Rows text = rows("PARTTEXT");
+        const Rows textLang = rows("PARTTEXTLANG");
+        const Rows alt = rows("PARTALT");
+        const Rows arc = rows("PARTARC");
 
         const auto specNames = list({"", "צבע", "חומר", "מידה", "", "משקל (גרם)", "תקן"});
         for (size_t n = 0; n < specNames.size(); ++n)
             specTypes.add({int(n), specNames[n]});
 
-        const Item& screw = m_items[1];
-        const Item& drill = m_items[5];
-        const Item& g0 = m_items[6];
-        const Item& g1 = m_items[7];
-        const Item& g2 = m_items[8];
-        const Item& g3 = m_items[9];
+        // Item ids: the screw and the drill of the odd items, then four generated ones.
+        struct Id {
+            int id;
+        };
+        const Id screw{2}, drill{6}, g0{7}, g1{8}, g2{9}, g3{10};
 
         files.add({screw.id, -1, u8("..\\system\\mail\\pics\\OR-5.jpg"), u8("תמונה")});
         files.add({screw.id, 1, u8("..\\system\\mail\\docs\\OR-5.pdf"), u8("מפרט טכני")});
         files.add({drill.id, -1, u8("c:\\pics\\makita-482.png"), u8("Picture")});
         files.add({g0.id, -1, u8(""), u8("")});
 
-        auto specRow = [&](const Item& it, std::vector<QVariant> values) {
+        auto specRow = [&](int id, std::vector<QVariant> values) {
             values.resize(10);
-            values.insert(values.begin(), it.id);
+            values.insert(values.begin(), id);
             partSpecs.add(values);
         };
-        specRow(screw, {u8("כסוף"), u8("נירוסטה 304"), u8("M6x20"), u8(""), u8("8"), u8("DIN 933")});
-        specRow(drill, {u8("טורקיז"), kNull, u8(""), u8("Li-Ion"), u8("1700"), u8("CE")});
+        specRow(screw.id, {u8("כסוף"), u8("נירוסטה 304"), u8("M6x20"), u8(""), u8("8"), u8("DIN 933")});
+        specRow(drill.id, {u8("טורקיז"), kNull, u8(""), u8("Li-Ion"), u8("1700"), u8("CE")});
 
-        auto texts = [&](const Item& it, std::initializer_list<const char*> he, std::initializer_list<const char*> en) {
+        auto texts = [&](const Id& it, std::initializer_list<const char*> he, std::initializer_list<const char*> en) {
             int ord = 0;
             for (const char* t : he)
                 text.add({it.id, ++ord, u8(t)});
@@ -1030,12 +1219,12 @@ private:
 
         // A sprinkling of further cards, so large companies have some too.
         for (int i = 10; i < m_itemCount; i += 25) {
-            const Item& it = m_items[size_t(i)];
-            specRow(it, {rng.chance(50) ? QVariant(u8("שחור")) : kNull, u8("פלדה"), QString::number(rng.between(1, 99))});
+            const Item it = m_items.item(i);
+            specRow(it.id, {rng.chance(50) ? QVariant(u8("שחור")) : kNull, u8("פלדה"), QString::number(rng.between(1, 99))});
             text.add({it.id, 1, it.des});
             textLang.add({it.id, 1, it.edes.toString()});
             if (i % 50 == 10 && it.type == u'P')
-                arc.add({it.id, lineItem(rng).id, 1.0, double(rng.between(1, 6)), day(-60), day(300)});
+                arc.add({it.id, lineItem(rng) + 1, 1.0, double(rng.between(1, 6)), day(-60), day(300)});
         }
     }
 
@@ -1044,7 +1233,7 @@ private:
     void labelLists()
     {
         Random rng(0xB00B);
-        Table& users = m_company["USERS"];
+        const Rows users = rows("USERS");
         users.add({0, u8("system")});
         users.add({1, u8("admin")});
         users.add({2, u8("avi")});
@@ -1053,27 +1242,27 @@ private:
         users.add({5, u8("")}); // no login: left out of the user list
         users.add({6, u8("warehouse")});
 
-        Table& defs = m_company["LABELSDEF"];
+        const Rows defs = rows("LABELSDEF");
         defs.add({1, u8("מדבקת מדף"), u8("c:\\labels\\shelf.lbl")});
         defs.add({2, u8("מדבקת קרטון"), u8("")});
         defs.add({3, u8("מדבקת מחיר (מבצע)"), kNull});
         defs.add({4, u8("Product 50x30"), u8("\\\\server\\labels\\product.lbl")});
         defs.add({5, u8(""), u8("c:\\labels\\plain.lbl")});
 
-        Table& labels = m_company["LABELS"];
+        const Rows labels = rows("LABELS");
         const auto& fams = families();
         int kline = 0;
         // User 3 has an empty list.
         for (const auto& [user, count] : {std::pair{1, 8}, std::pair{2, 3}, std::pair{4, 2}, std::pair{6, 12}}) {
             for (int n = 0; n < count; ++n) {
-                const Item& it = n == 0 && user == 1 ? m_items[0] : lineItem(rng);
+                const Item it = m_items.item(n == 0 && user == 1 ? 0 : lineItem(rng));
                 std::vector<QVariant> row{user, ++kline, n == 2 ? 0 : rng.between(1, 10), rng.between(1, 5),
                                           rng.between(1, 4)};
                 row.push_back(it.key);
                 row.push_back(it.des);
                 row.push_back(it.barcode);
                 row.push_back(QString::number(money(it.cents), 'f', 2));
-                row.push_back(m_company["UNIT"].cell(it.unit - 1, 1));
+                row.push_back(unitNames()[size_t(it.unit - 1)]);
                 row.push_back(kNull);
                 row.push_back(u8(""));
                 row.push_back(u8(fams[size_t(it.family - 1)].des));
@@ -1083,20 +1272,14 @@ private:
         }
     }
 
-    struct Customer {
-        int id;
-        QString key;
-        int mcust;
-    };
-
     const DemoOptions m_options;
     const QDate m_today;
     const int m_itemCount;
-    Company m_company;
-    std::vector<Item> m_items;  // types R and P
-    std::vector<Item> m_others; // other types
-    std::vector<Customer> m_customers;
-    std::vector<QString> m_suppliers; // keys, id = position + 1
+    const std::vector<Table>& m_tables;
+    RowSink& m_sink;
+    ItemSource m_items;
+    int m_customerCount = 0; // ids 1 to this
+    int m_supplierCount = 0; // ids 1 to this
     int m_trans = 0;
     int m_lastDoc = 0;
 };
@@ -1182,11 +1365,80 @@ QString sqlLiteral(const QVariant& v)
     }
 }
 
+// The SQLite writer: each row inserted as it comes, through one prepared
+// statement a table, all in the one transaction.
+class SqliteRows : public RowSink {
+public:
+    SqliteRows(const std::vector<Table>& tables, short connType)
+        : m_tables(tables)
+        , m_connType(connType)
+    {
+    }
+
+    DbError prepare(Database& db)
+    {
+        for (const Table& t : m_tables) {
+            QStringList marks;
+            for (size_t i = 1; i <= t.columns.size(); ++i)
+                marks << QStringLiteral("?%1").arg(i);
+            DbError e;
+            m_inserts.push_back(db.prepare(QStringLiteral("INSERT INTO %1 (%2) VALUES (%3)")
+                                               .arg(t.name, columnList(t, Dialect::Sqlite), marks.join(QLatin1String(", "))),
+                                           &e));
+            if (e)
+                return e;
+        }
+        return {};
+    }
+
+    void add(size_t table, const QVariant* cells, size_t count) override
+    {
+        if (m_error)
+            return;
+        Statement& insert = m_inserts[table];
+        const std::vector<Column>& columns = m_tables[table].columns;
+        for (size_t c = 0; c < count; ++c)
+            if (!insert.bind(int(c + 1), storedValue(columns[c], cells[c], m_connType))) {
+                m_error = insert.error();
+                return;
+            }
+        m_error = insert.run();
+    }
+    bool failed() const override { return m_error.isError(); }
+    const DbError& error() const { return m_error; }
+
+private:
+    const std::vector<Table>& m_tables;
+    const short m_connType;
+    std::vector<Statement> m_inserts;
+    DbError m_error;
+};
+
+// The script writer gathers every table's rows, in order, to print them
+// table after table.
+class GatheredRows : public RowSink {
+public:
+    explicit GatheredRows(size_t tables)
+        : m_cells(tables)
+    {
+    }
+    void add(size_t table, const QVariant* cells, size_t count) override
+    {
+        m_cells[table].insert(m_cells[table].end(), cells, cells + count);
+    }
+    bool failed() const override { return false; }
+    // Row after row.
+    const std::vector<QVariant>& cells(size_t table) const { return m_cells[table]; }
+
+private:
+    std::vector<std::vector<QVariant>> m_cells;
+};
+
 } // namespace
 
 DbError CreateDemoErp(const QString& path, const DemoOptions& options)
 {
-    const Company company = Builder(options).build();
+    const std::vector<Table> tables = schema(options.labelLists);
 
     if (QFile::exists(path) && !QFile::remove(path))
         return DbError::other(QStringLiteral("cannot replace %1").arg(path));
@@ -1199,31 +1451,20 @@ DbError CreateDemoErp(const QString& path, const DemoOptions& options)
         if (tx.error())
             return tx.error();
         result = [&]() -> DbError {
-            for (const Table& t : company.tables) {
+            for (const Table& t : tables)
                 if (DbError e = db.exec(createTableSql(t, options.connType, Dialect::Sqlite)))
                     return e;
-                QStringList marks;
-                for (size_t i = 1; i <= t.columns.size(); ++i)
-                    marks << QStringLiteral("?%1").arg(i);
-                DbError e;
-                Statement insert = db.prepare(QStringLiteral("INSERT INTO %1 (%2) VALUES (%3)")
-                                                  .arg(t.name, columnList(t, Dialect::Sqlite), marks.join(QLatin1String(", "))),
-                                              &e);
-                if (e)
-                    return e;
-                const int rows = t.rowCount();
-                for (int r = 0; r < rows; ++r) {
-                    for (size_t c = 0; c < t.columns.size(); ++c)
-                        if (!insert.bind(int(c + 1), storedValue(t.columns[c], t.cell(r, int(c)), options.connType)))
-                            return insert.error();
-                    if (DbError e = insert.run())
-                        return e;
-                }
-                // Indexes after the rows: cheaper than keeping them up to date.
+            SqliteRows sink(tables, options.connType);
+            if (DbError e = sink.prepare(db))
+                return e;
+            Builder(options, tables, sink).build();
+            if (sink.failed())
+                return sink.error();
+            // Indexes after the rows: cheaper than keeping them up to date.
+            for (const Table& t : tables)
                 for (const QString& sql : createIndexSql(t, Dialect::Sqlite))
                     if (DbError e = db.exec(sql))
                         return e;
-            }
             return {};
         }();
         if (!result)
@@ -1236,18 +1477,23 @@ DbError CreateDemoErp(const QString& path, const DemoOptions& options)
 
 QString DemoErpScript(const DemoOptions& options)
 {
-    const Company company = Builder(options).build();
+    const std::vector<Table> tables = schema(options.labelLists);
+    GatheredRows gathered(tables.size());
+    Builder(options, tables, gathered).build();
     const Dialect pg = Dialect::Postgres;
     QString out;
     out += QLatin1String("-- Tagora demo ERP company (connection type ") + QString::number(options.connType)
         + QLatin1String(", ") + options.today.toString(Qt::ISODate) + QLatin1String(")\n");
     out += QLatin1String("SET client_encoding = 'UTF8';\nSET standard_conforming_strings = on;\n"
                           "SET client_min_messages = warning;\nBEGIN;\n");
-    for (auto it = company.tables.rbegin(); it != company.tables.rend(); ++it)
+    for (auto it = tables.rbegin(); it != tables.rend(); ++it)
         out += QLatin1String("DROP TABLE IF EXISTS ") + it->name + QLatin1String(";\n");
-    for (const Table& t : company.tables) {
+    for (size_t ti = 0; ti < tables.size(); ++ti) {
+        const Table& t = tables[ti];
+        const std::vector<QVariant>& cells = gathered.cells(ti);
+        const size_t width = t.columns.size();
         out += QLatin1Char('\n') + createTableSql(t, options.connType, pg) + QLatin1String(";\n");
-        const int rows = t.rowCount();
+        const int rows = int(cells.size() / width);
         const QString head = QLatin1String("INSERT INTO ") + t.name + QLatin1String(" (") + columnList(t, pg)
             + QLatin1String(") VALUES\n");
         // Several hundred rows a statement keeps the load quick without
@@ -1255,10 +1501,10 @@ QString DemoErpScript(const DemoOptions& options)
         for (int r = 0; r < rows; ++r) {
             out += r % 500 == 0 ? head : QStringLiteral(",\n");
             out += QLatin1Char('(');
-            for (size_t c = 0; c < t.columns.size(); ++c) {
+            for (size_t c = 0; c < width; ++c) {
                 if (c)
                     out += QLatin1String(", ");
-                out += sqlLiteral(storedValue(t.columns[c], t.cell(r, int(c)), options.connType));
+                out += sqlLiteral(storedValue(t.columns[c], cells[size_t(r) * width + c], options.connType));
             }
             out += QLatin1Char(')');
             if (r % 500 == 499 || r == rows - 1)

@@ -28,11 +28,14 @@ struct DemoOptions {
 };
 
 // Creates the demo ERP as an SQLite file at path, replacing any file there.
+// Rows are inserted as they are made, in one transaction, so memory stays the
+// same whatever the number of items; on an error the file is removed.
 DbError CreateDemoErp(const QString& path, const DemoOptions& options);
 
 // The same tables and rows as a PostgreSQL script (DROP/CREATE TABLE, INSERT,
 // CREATE INDEX in one transaction), loadable with `psql -v ON_ERROR_STOP=1 -f`.
-// Identifiers are unquoted and upper-case, as in the SQLite file.
+// Identifiers are unquoted and upper-case, as in the SQLite file. The script
+// is held whole, rows and text: meant for test-sized companies.
 QString DemoErpScript(const DemoOptions& options);
 
 } // namespace tagora
