@@ -109,6 +109,8 @@ public:
     // Status line and progress bar.
     void setMessage(const QString& text) override;
     void setProgress(double fraction) override;
+    // During an import: Esc cancels it (see CancellableWork).
+    bool cancelRequested() override;
     QString message() const;
     double progress() const { return m_progress; }
 
@@ -199,6 +201,10 @@ private:
     CommonDialog* m_fileDialog = nullptr;
     SharedDialogState m_shared;
     double m_progress = 0.0;
+    // While an import runs: the screen keeps painting and takes Esc as a
+    // cancel, and no other input reaches the control.
+    class CancellableWork;
+    CancellableWork* m_work = nullptr;
     // Set by each document import for the item readers that run by documents.
     QString m_currentDocCriteria;
     QString m_currentItemByDocCriteria;

@@ -12,7 +12,10 @@
 
 #include "ui_maincard.h"
 
+#include <QCoreApplication>
+#include <QElapsedTimer>
 #include <QFileInfo>
+#include <QKeyEvent>
 
 #include <cmath>
 
@@ -198,6 +201,68 @@ void MainCard::CmdConnect_Click()
         RefillErpLists();
 }
 
+// Long work on the screen's own thread: between rows the readers ask whether
+// to stop, and that is when the screen catches up. Painting and moving the
+// window go on; of the user's input only Esc gets through, as a cancel, so
+// no command can start in the middle of another.
+class MainCard::CancellableWork : public QObject {
+public:
+    explicit CancellableWork(MainCard* card)
+        : m_card(card)
+    {
+        card->m_work = this;
+    }
+    ~CancellableWork() override { m_card->m_work = nullptr; }
+
+    bool cancelRequested()
+    {
+        // Often enough for the bar and an Esc to feel immediate, rarely
+        // enough to cost the import nothing.
+        if (!m_polled.isValid() || m_polled.elapsed() >= 50) {
+            m_polled.start();
+            // Filtered only while the screen catches up, so a message box
+            // the work shows afterwards takes its clicks as usual.
+            qApp->installEventFilter(this);
+            QCoreApplication::processEvents();
+            qApp->removeEventFilter(this);
+        }
+        return m_cancelled;
+    }
+
+protected:
+    bool eventFilter(QObject*, QEvent* event) override
+    {
+        switch (event->type()) {
+        case QEvent::KeyPress:
+            if (static_cast<QKeyEvent*>(event)->key() == Qt::Key_Escape)
+                m_cancelled = true;
+            return true;
+        case QEvent::KeyRelease:
+        case QEvent::MouseButtonPress:
+        case QEvent::MouseButtonRelease:
+        case QEvent::MouseButtonDblClick:
+        case QEvent::Wheel:
+        case QEvent::ShortcutOverride:
+        case QEvent::Shortcut:
+        case QEvent::TouchBegin:
+        case QEvent::Close:
+            return true;
+        default:
+            return false;
+        }
+    }
+
+private:
+    MainCard* m_card;
+    QElapsedTimer m_polled;
+    bool m_cancelled = false;
+};
+
+bool MainCard::cancelRequested()
+{
+    return m_work && m_work->cancelRequested();
+}
+
 void MainCard::ImportItems()
 {
     if (ui->ChkCleanAlterKeys->isChecked()
@@ -250,6 +315,7 @@ void MainCard::ImportItems()
 
     const QString fromSort = ui->txtFromItemSort->text();
     const QString toSort = ui->txtToItemSort->text();
+    CancellableWork work(this);
     setMessage(QStringLiteral("קורא פריטים..."));
     {
         ReadError readError;

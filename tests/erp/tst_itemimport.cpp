@@ -12,6 +12,7 @@
 
 #include <QCheckBox>
 #include <QComboBox>
+#include <QKeyEvent>
 #include <QLineEdit>
 #include <QPushButton>
 #include <QtTest>
@@ -358,6 +359,24 @@ private slots:
         }
         QVERIFY(sink.most > 0);
         QCOMPARE(sink.last, 0.0);
+    }
+
+    // On the screen Esc cancels an import, and the items stay as they were.
+    void escapeCancelsImportOnScreen()
+    {
+        const QString data = work.filePath(QStringLiteral("data%1").arg(++fresh));
+        QVERIFY(!PrepareDataFolder(data));
+        const QString items = data + "/" + dbfiles::Items;
+        QVERIFY(!execOn(items, "INSERT INTO tItems (ItemKey, Copies) VALUES ('KEPT', 4)"));
+        CardFixture f(QStringLiteral("[Params]\nConnServer=%1\nConnType=2\n[GeneralParams]\nDBPath=%2\n")
+                          .arg(kDsn2, data)
+                          .toUtf8());
+        f.c<QCheckBox>("ChkClean")->setChecked(true);
+        QCoreApplication::postEvent(f.card.get(), new QKeyEvent(QEvent::KeyPress, Qt::Key_Escape, Qt::NoModifier));
+        const int shown = f.prompt->criticalCount();
+        f.c<QPushButton>("CmdImportItems")->click();
+        QCOMPARE(f.prompt->criticalCount(), shown + 1);
+        QCOMPARE(rows(items, "SELECT ItemKey, Copies FROM tItems"), QStringList{"KEPT|4"});
     }
 
     void unreachableErp_data()
