@@ -13,6 +13,13 @@ namespace tagora {
 namespace {
 int s_busyTimeoutMs = 5000;
 
+// The engine counts every allocation under one process-wide lock, for
+// figures this program never reads. An import runs two connections at once
+// (the ERP's SQLite driver reads while the local file is written), and that
+// lock was where the two threads met. It can only be turned off before the
+// engine starts, so it is done while the program loads.
+const bool s_engineConfigured = [] { return sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0) == SQLITE_OK; }();
+
 QString quotedName(const QString& name)
 {
     QString n = name;
