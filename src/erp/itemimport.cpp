@@ -226,8 +226,8 @@ struct ProgressBasis {
 
 // The frame every reader shares: connection, query, local database, one
 // transaction, progress, and the writing thread. The reading thread (the
-// caller's, so the screen's progress bar keeps moving) reads and converts
-// each row; the writer binds and runs the statement. Either side failing,
+// caller's, so the screen's progress bar keeps moving) fetches each row;
+// the writer converts it, binds and runs the statement. Either side failing,
 // or the user cancelling, rolls the transaction back: the local database is
 // left as it was before the reader started.
 class ReaderRun {

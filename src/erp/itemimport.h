@@ -30,9 +30,9 @@ struct ReadError {
 };
 
 // The readers: each opens its own ERP connection and local database and walks
-// its query forward-only, converting each row on the calling thread (which
-// also reports progress every fifth row and asks whether to cancel), while a
-// second thread writes the rows in one transaction with a prepared statement.
+// its query forward-only on the calling thread (which also reports progress
+// every fifth row and asks whether to cancel), while a second thread converts
+// the rows and writes them in one transaction with a prepared statement.
 // A duplicate key in the local table skips that row. Any other error on
 // either side, or a cancel, rolls the transaction back, so the local database
 // is as it was before the reader began, and the reader returns false. With
