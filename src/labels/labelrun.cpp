@@ -292,14 +292,13 @@ private:
             m_fieldColumns.assign(m_r.fields.size(), Unresolved);
         for (size_t i = 0; i < m_r.fields.size(); ++i) {
             const SentField& f = m_r.fields[i];
-            const int& c = m_fieldColumns[i];
-            if (!resolve(f.column, &m_fieldColumns[i]))
+            int& c = m_fieldColumns[i];
+            if (!resolve(f.column, &c))
                 return false;
-            // Only a price needs the value itself; other fields read as text.
-            const QString t = f.price ? FormatNumber(m_records.value(c), priceFormat) : m_records.text(c);
             m_trace.lastVar = f.name;
-            m_trace.lastValue = t;
-            if (!m_program->setVariable(f.name, t, m_trace, &m_error))
+            // Only a price needs the value itself; other fields read as text.
+            m_trace.lastValue = f.price ? FormatNumber(m_records.value(c), priceFormat) : m_records.text(c);
+            if (!m_program->setVariable(f.name, m_trace.lastValue, m_trace, &m_error))
                 return false;
         }
         return true;
