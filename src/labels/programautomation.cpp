@@ -148,7 +148,8 @@ private:
 // Writes the value as the journal writes it.
 void putValue(LineBuffer& out, const QVariant& value)
 {
-    if (!value.isValid() || value.isNull()) {
+    // isNull() is also true for a value of no type.
+    if (value.isNull()) {
         out.putAscii("Null");
         return;
     }
