@@ -116,13 +116,16 @@ public:
     bool setVariable(const QString& name, const QString& text, RunTrace& trace, QString* error) override
     {
         // One list for every variable of the run, its changing places set in
-        // turn: a run sends tens of fields per record.
-        if (m_setVarArgs.isEmpty())
+        // place (the values' storage is reused): a run sends tens of fields
+        // per record.
+        if (m_setVarArgs.isEmpty()) {
             m_setVarArgs = {trace.labelId, name, text, -9999, -9999};
-        else {
-            m_setVarArgs[0] = trace.labelId;
-            m_setVarArgs[1] = name;
-            m_setVarArgs[2] = text;
+        } else {
+            QVariant* args = m_setVarArgs.data();
+            if (*static_cast<const qlonglong*>(args[0].constData()) != trace.labelId)
+                args[0].setValue(trace.labelId);
+            args[1].setValue(name);
+            args[2].setValue(text);
         }
         return call(*m_app, QStringLiteral("LabelSetVar"), m_setVarArgs, error);
     }

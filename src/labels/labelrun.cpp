@@ -196,11 +196,19 @@ private:
     // As column(name), with the index kept in *slot after the first record.
     bool column(const QString& name, QVariant* value, int* slot)
     {
+        if (!resolve(name, slot))
+            return false;
+        *value = m_records.value(*slot);
+        return true;
+    }
+
+    // The column's index in *slot, looked up for the first record only.
+    bool resolve(const QString& name, int* slot)
+    {
         if (*slot == Unresolved)
             *slot = columnIndex(name);
         if (*slot < 0)
             return fail(QStringLiteral("העמודה %1 אינה ברשומת המדבקה").arg(name));
-        *value = m_records.value(*slot);
         return true;
     }
 
@@ -284,13 +292,13 @@ private:
             m_fieldColumns.assign(m_r.fields.size(), Unresolved);
         for (size_t i = 0; i < m_r.fields.size(); ++i) {
             const SentField& f = m_r.fields[i];
-            QVariant value;
-            if (!column(f.column, &value, &m_fieldColumns[i]))
+            int& c = m_fieldColumns[i];
+            if (!resolve(f.column, &c))
                 return false;
-            const QString t = f.price ? FormatNumber(value, priceFormat) : text(value);
             m_trace.lastVar = f.name;
-            m_trace.lastValue = t;
-            if (!m_program->setVariable(f.name, t, m_trace, &m_error))
+            // Only a price needs the value itself; other fields read as text.
+            m_trace.lastValue = f.price ? FormatNumber(m_records.value(c), priceFormat) : m_records.text(c);
+            if (!m_program->setVariable(f.name, m_trace.lastValue, m_trace, &m_error))
                 return false;
         }
         return true;

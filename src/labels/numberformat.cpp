@@ -2,7 +2,10 @@
 
 #include <QHash>
 #include <QStringList>
+#include <QVarLengthArray>
+#include <algorithm>
 #include <cmath>
+#include <cstring>
 #include <memory>
 
 namespace tagora {
@@ -101,44 +104,59 @@ QString named(const QString& pattern)
     return pattern;
 }
 
+// Digits written into a small buffer rather than text per step: a run formats
+// every price of every record.
+using DigitBuffer = QVarLengthArray<char, 64>;
+
 // The digits of |value| rounded to `decimals` places, halves away from zero,
-// working on the number as its 15 significant digits write it.
-std::pair<QString, QString> roundedDigits(double value, int decimals)
+// working on the number as its 15 significant digits write it: the whole
+// part's digits then exactly `decimals` fraction digits, in *digits. Returns
+// where the whole part starts (leading zeros skipped, one digit kept).
+qsizetype roundedDigits(double value, int decimals, DigitBuffer* digits)
 {
     const double a = std::fabs(value);
     const int magnitude = a >= 1.0 ? int(std::floor(std::log10(a))) : 0;
-    QString text = QString::number(a, 'f', std::max(0, 14 - magnitude));
-    // text: digits '.' digits
-    int dot = text.indexOf(QLatin1Char('.'));
-    if (dot < 0) {
-        text += QLatin1Char('.');
-        dot = int(text.size()) - 1;
-    }
-    QString intPart = text.left(dot);
-    QString frac = text.mid(dot + 1);
-    while (frac.size() < decimals + 1)
-        frac += QLatin1Char('0');
-    const bool up = frac[decimals] >= QLatin1Char('5');
-    QString digits = intPart + frac.left(decimals);
-    if (up) {
-        int i = int(digits.size()) - 1;
-        while (i >= 0) {
-            if (digits[i] == QLatin1Char('9')) {
-                digits[i] = QLatin1Char('0');
-                --i;
+    const QString text = QString::number(a, 'f', std::max(0, 14 - magnitude));
+    // text: digits, then '.' and digits when there are decimals
+    const QChar* t = text.constData();
+    qsizetype dot = text.indexOf(QLatin1Char('.'));
+    if (dot < 0)
+        dot = text.size();
+    const qsizetype fracStart = dot + 1;
+    const qsizetype fracAvailable = std::max<qsizetype>(0, text.size() - fracStart);
+    const auto fracDigit = [&](qsizetype k) { return k < fracAvailable ? char(t[fracStart + k].unicode()) : '0'; };
+    digits->clear();
+    for (qsizetype i = 0; i < dot; ++i)
+        digits->append(char(t[i].unicode()));
+    for (int k = 0; k < decimals; ++k)
+        digits->append(fracDigit(k));
+    if (fracDigit(decimals) >= '5') {
+        qsizetype i = digits->size() - 1;
+        for (; i >= 0; --i) {
+            char& d = (*digits)[i];
+            if (d == '9') {
+                d = '0';
             } else {
-                digits[i] = QChar(digits[i].unicode() + 1);
+                ++d;
                 break;
             }
         }
         if (i < 0)
-            digits.prepend(QLatin1Char('1'));
+            digits->insert(digits->cbegin(), '1');
     }
-    const int intLen = int(digits.size()) - decimals;
-    QString whole = digits.left(intLen);
-    while (whole.size() > 1 && whole.startsWith(QLatin1Char('0')))
-        whole.remove(0, 1);
-    return {whole, digits.mid(intLen)};
+    const qsizetype intLen = digits->size() - decimals;
+    qsizetype wholeStart = 0;
+    while (intLen - wholeStart > 1 && (*digits)[wholeStart] == '0')
+        ++wholeStart;
+    return wholeStart;
+}
+
+bool anyNonZero(const char* digits, qsizetype size)
+{
+    for (qsizetype i = 0; i < size; ++i)
+        if (digits[i] >= '1' && digits[i] <= '9')
+            return true;
+    return false;
 }
 
 QString render(double value, const Section& s, bool withSign)
@@ -146,27 +164,41 @@ QString render(double value, const Section& s, bool withSign)
     if (!s.placeholders)
         return s.prefix + s.suffix;
     const double v = s.percent ? value * 100.0 : value;
-    auto [whole, frac] = roundedDigits(v, s.maxFrac);
-    while (frac.size() > s.minFrac && frac.endsWith(QLatin1Char('0')))
-        frac.chop(1);
-    if (whole == QLatin1String("0") && s.minInt == 0)
-        whole.clear();
-    while (whole.size() < s.minInt)
-        whole.prepend(QLatin1Char('0'));
-    if (s.grouping)
-        for (int i = int(whole.size()) - 3; i > 0; i -= 3)
-            whole.insert(i, QLatin1Char(','));
-    const auto nonZero = [](const QString& digits) {
-        for (const QChar c : digits)
-            if (c >= QLatin1Char('1') && c <= QLatin1Char('9'))
-                return true;
-        return false;
-    };
-    const bool zero = !nonZero(whole) && !nonZero(frac);
-    QString out = whole;
-    if (s.point)
-        out += QLatin1Char('.') + frac;
-    return (withSign && value < 0 && !zero ? QStringLiteral("-") : QString()) + s.prefix + out + s.suffix;
+    DigitBuffer digits;
+    const qsizetype wholeStart = roundedDigits(v, s.maxFrac, &digits);
+    const char* whole = digits.constData() + wholeStart;
+    qsizetype wholeLen = digits.size() - s.maxFrac - wholeStart;
+    const char* frac = digits.constData() + digits.size() - s.maxFrac;
+    qsizetype fracLen = s.maxFrac;
+    while (fracLen > s.minFrac && frac[fracLen - 1] == '0')
+        --fracLen;
+    if (wholeLen == 1 && whole[0] == '0' && s.minInt == 0)
+        wholeLen = 0;
+    const bool zero = !anyNonZero(whole, wholeLen) && !anyNonZero(frac, fracLen);
+
+    // The number: zeros up to the least whole digits, groups of three, the fraction.
+    const qsizetype padding = std::max<qsizetype>(0, s.minInt - wholeLen);
+    const qsizetype wholeDigits = padding + wholeLen;
+    DigitBuffer number;
+    number.reserve(wholeDigits + wholeDigits / 3 + 1 + fracLen);
+    for (qsizetype i = 0; i < wholeDigits; ++i) {
+        if (s.grouping && i > 0 && (wholeDigits - i) % 3 == 0)
+            number.append(',');
+        number.append(i < padding ? '0' : whole[i - padding]);
+    }
+    if (s.point) {
+        number.append('.');
+        number.append(frac, fracLen);
+    }
+    const bool minus = withSign && value < 0 && !zero;
+    QString out;
+    out.reserve(qsizetype(minus) + s.prefix.size() + number.size() + s.suffix.size());
+    if (minus)
+        out += QLatin1Char('-');
+    out += s.prefix;
+    out += QLatin1String(number.constData(), number.size());
+    out += s.suffix;
+    return out;
 }
 
 // A pattern as the formatter uses it, parsed once: a run formats every
@@ -246,14 +278,27 @@ QString FormatNumber(const QVariant& value, const QString& pattern)
     double v = 0;
     if (!numberOf(value, &v) || !std::isfinite(v))
         return value.toString();
-    const Pattern* p = compiled(pattern).get();
+    const std::shared_ptr<const Pattern>& p = compiled(pattern);
+    // A record often holds the same price in several fields (price, special
+    // price, list price): the last number written by the last pattern is kept.
+    thread_local std::shared_ptr<const Pattern> lastPattern;
+    thread_local double lastValue = 0;
+    thread_local QString lastText;
+    if (lastPattern == p && std::memcmp(&lastValue, &v, sizeof v) == 0)
+        return lastText;
+    QString text;
     if (p->general)
-        return QString::number(v, 'g', 15);
-    if (v == 0 && p->hasZero)
-        return render(0, p->zero, false);
-    if (v < 0 && p->hasNegative)
-        return render(-v, p->negative, false);
-    return render(v, p->positive, true);
+        text = QString::number(v, 'g', 15);
+    else if (v == 0 && p->hasZero)
+        text = render(0, p->zero, false);
+    else if (v < 0 && p->hasNegative)
+        text = render(-v, p->negative, false);
+    else
+        text = render(v, p->positive, true);
+    lastPattern = p;
+    lastValue = v;
+    lastText = text;
+    return text;
 }
 
 } // namespace tagora

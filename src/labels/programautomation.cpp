@@ -2,7 +2,9 @@
 
 #include <QDir>
 
+#include <algorithm>
 #include <charconv>
+#include <cstring>
 
 namespace tagora {
 
@@ -34,83 +36,193 @@ std::shared_ptr<AutomationObject> AutomationRegistry::create(const QString& prog
 }
 
 namespace {
-void appendInteger(QString& out, long long v)
-{
-    char digits[24];
-    const auto end = std::to_chars(digits, digits + sizeof digits, v).ptr;
-    out += QLatin1String(digits, end - digits);
-}
+// Journal lines, written straight into one UTF-8 buffer whose capacity stays
+// between lines: no text is built per call and encoded afterwards.
+class LineBuffer {
+public:
+    const char* data() const { return m_buffer.constData(); }
+    qsizetype size() const { return m_used; }
+    void clear() { m_used = 0; }
+    void truncate(qsizetype size) { m_used = size; }
 
-// Appends the value as the journal writes it, straight onto the line.
-void appendJournalValue(QString& out, const QVariant& value)
+    void putAscii(const char* text, qsizetype size)
+    {
+        std::memcpy(reserve(size), text, size_t(size));
+        m_used += size;
+    }
+    template <qsizetype N>
+    void putAscii(const char (&text)[N])
+    {
+        putAscii(text, N - 1);
+    }
+    void putBytes(const QByteArray& bytes) { putAscii(bytes.constData(), bytes.size()); }
+
+    void putInteger(long long v)
+    {
+        char* out = reserve(24);
+        m_used = std::to_chars(out, out + 24, v).ptr - m_buffer.constData();
+    }
+
+    // Text in UTF-8; quoted, in double quotes with " \ newline, return and
+    // tab escaped. Text with surrogates (rare) goes through Qt's encoder from
+    // the first one on, which also decides what a lone one becomes.
+    void putText(QStringView text, bool quoted)
+    {
+        char* out = reserve(text.size() * 3 + 2);
+        if (quoted)
+            *out++ = '"';
+        const char16_t* p = text.utf16();
+        const char16_t* const end = p + text.size();
+        for (; p != end; ++p) {
+            const char16_t u = *p;
+            if (u < 0x80) {
+                if (quoted) {
+                    char escaped = 0;
+                    switch (u) {
+                    case '"': escaped = '"'; break;
+                    case '\\': escaped = '\\'; break;
+                    case '\n': escaped = 'n'; break;
+                    case '\r': escaped = 'r'; break;
+                    case '\t': escaped = 't'; break;
+                    default: break;
+                    }
+                    if (escaped) {
+                        *out++ = '\\';
+                        *out++ = escaped;
+                        continue;
+                    }
+                }
+                *out++ = char(u);
+            } else if (u < 0x800) {
+                *out++ = char(0xC0 | (u >> 6));
+                *out++ = char(0x80 | (u & 0x3F));
+            } else if (QChar::isSurrogate(u)) {
+                m_used = out - m_buffer.constData();
+                putRest(QStringView(p, end), quoted);
+                return;
+            } else {
+                *out++ = char(0xE0 | (u >> 12));
+                *out++ = char(0x80 | ((u >> 6) & 0x3F));
+                *out++ = char(0x80 | (u & 0x3F));
+            }
+        }
+        if (quoted)
+            *out++ = '"';
+        m_used = out - m_buffer.constData();
+    }
+
+private:
+    QByteArray m_buffer; // its size is its capacity; the first m_used bytes are written
+    qsizetype m_used = 0;
+
+    // Room for n more bytes after what is written.
+    char* reserve(qsizetype n)
+    {
+        if (m_used + n > m_buffer.size())
+            m_buffer.resize(std::max(m_buffer.size() * 2, m_used + n + 1024));
+        return m_buffer.data() + m_used;
+    }
+
+    void putRest(QStringView rest, bool quoted)
+    {
+        QString text;
+        if (quoted) {
+            for (const QChar c : rest) {
+                switch (c.unicode()) {
+                case '"': text += QLatin1String("\\\""); break;
+                case '\\': text += QLatin1String("\\\\"); break;
+                case '\n': text += QLatin1String("\\n"); break;
+                case '\r': text += QLatin1String("\\r"); break;
+                case '\t': text += QLatin1String("\\t"); break;
+                default: text += c; break;
+                }
+            }
+            text += QLatin1Char('"');
+        } else {
+            text = rest.toString();
+        }
+        putBytes(text.toUtf8());
+    }
+};
+
+// Writes the value as the journal writes it.
+void putValue(LineBuffer& out, const QVariant& value)
 {
-    if (!value.isValid() || value.isNull()) {
-        out += QLatin1String("Null");
+    // isNull() is also true for a value of no type.
+    if (value.isNull()) {
+        out.putAscii("Null");
         return;
     }
     switch (value.metaType().id()) {
-    case QMetaType::Bool: out += value.toBool() ? QLatin1String("True") : QLatin1String("False"); return;
-    case QMetaType::Int: appendInteger(out, *static_cast<const int*>(value.constData())); return;
-    case QMetaType::LongLong: appendInteger(out, *static_cast<const qlonglong*>(value.constData())); return;
+    case QMetaType::Bool:
+        if (*static_cast<const bool*>(value.constData()))
+            out.putAscii("True");
+        else
+            out.putAscii("False");
+        return;
+    case QMetaType::Int: out.putInteger(*static_cast<const int*>(value.constData())); return;
+    case QMetaType::LongLong: out.putInteger(*static_cast<const qlonglong*>(value.constData())); return;
     case QMetaType::UInt:
     case QMetaType::Short:
     case QMetaType::UShort:
     case QMetaType::ULongLong:
-    case QMetaType::Long: appendInteger(out, value.toLongLong()); return;
+    case QMetaType::Long: out.putInteger(value.toLongLong()); return;
     case QMetaType::Double:
-    case QMetaType::Float: out += QString::number(value.toDouble(), 'g', 15); return;
-    default: break;
+    case QMetaType::Float: out.putText(QString::number(value.toDouble(), 'g', 15), false); return;
+    case QMetaType::QString: out.putText(*static_cast<const QString*>(value.constData()), true); return;
+    default: out.putText(value.toString(), true); return;
     }
-    const QString t = value.metaType().id() == QMetaType::QString ? *static_cast<const QString*>(value.constData())
-                                                                   : value.toString();
-    out += QLatin1Char('"');
-    qsizetype from = 0;
-    for (qsizetype i = 0; i < t.size(); ++i) {
-        QLatin1String escaped;
-        switch (t[i].unicode()) {
-        case '"': escaped = QLatin1String("\\\""); break;
-        case '\\': escaped = QLatin1String("\\\\"); break;
-        case '\n': escaped = QLatin1String("\\n"); break;
-        case '\r': escaped = QLatin1String("\\r"); break;
-        case '\t': escaped = QLatin1String("\\t"); break;
-        default: continue;
-        }
-        out += QStringView(t).mid(from, i - from);
-        out += escaped;
-        from = i + 1;
+}
+
+void putArgs(LineBuffer& out, const QVariantList& args)
+{
+    for (qsizetype i = 0; i < args.size(); ++i) {
+        if (i > 0)
+            out.putAscii(", ");
+        putValue(out, args[i]);
     }
-    out += QStringView(t).mid(from);
-    out += QLatin1Char('"');
 }
 } // namespace
 
 QString journalValue(const QVariant& value)
 {
-    QString out;
-    appendJournalValue(out, value);
-    return out;
+    LineBuffer out;
+    putValue(out, value);
+    return QString::fromUtf8(out.data(), out.size());
 }
 
+// The journal file and the lines not yet in it. Lines are built in place at
+// the end of the buffer and reach the file in blocks of 64 KiB, at the latest
+// when the program is released.
 struct JournalProvider::Sink {
     QFile file;
     qint64 line = 0;
-    qint64 nanos = 0;
     bool failed = false;
     QString error;
-    QString text; // the line being built
+    LineBuffer pending;
+    qsizetype lineStart = 0;
 
-    // Writes one line; its number is the answer of a call. Lines are
-    // buffered and reach the file at the latest when the program is released.
-    qint64 write(const QString& text)
+    void beginLine() { lineStart = pending.size(); }
+
+    // Ends the line begun last; its number is the answer of a call. After a
+    // failed write lines are still counted, but no longer kept.
+    qint64 endLine()
     {
         ++line;
-        if (failed)
+        if (failed) {
+            pending.truncate(lineStart);
             return line;
-        encode(text);
-        pending += '\n';
+        }
+        pending.putAscii("\n");
         if (pending.size() >= BufferBytes)
             drain();
         return line;
+    }
+
+    // The line begun last, as far as it is written.
+    QByteArray lineSoFar() const
+    {
+        return QByteArray(pending.data() + lineStart, pending.size() - lineStart);
     }
 
     void flush()
@@ -124,77 +236,24 @@ struct JournalProvider::Sink {
 
 private:
     static constexpr qsizetype BufferBytes = 64 * 1024;
-    QByteArray pending;
 
-    // UTF-8 written in place; text with surrogates (rare) goes through Qt's
-    // encoder, which also decides what a lone one becomes.
-    void encode(const QString& text)
-    {
-        qsizetype at = pending.size();
-        pending.resize(at + text.size() * 3);
-        char* out = pending.data() + at;
-        for (const QChar c : text) {
-            const char16_t u = c.unicode();
-            if (u < 0x80) {
-                *out++ = char(u);
-            } else if (u < 0x800) {
-                *out++ = char(0xC0 | (u >> 6));
-                *out++ = char(0x80 | (u & 0x3F));
-            } else if (c.isSurrogate()) {
-                pending.resize(at);
-                pending += text.toUtf8();
-                return;
-            } else {
-                *out++ = char(0xE0 | (u >> 12));
-                *out++ = char(0x80 | ((u >> 6) & 0x3F));
-                *out++ = char(0x80 | (u & 0x3F));
-            }
-        }
-        pending.resize(out - pending.constData());
-    }
-
+    // Between lines only.
     void drain()
     {
-        if (failed || pending.isEmpty()) {
-            pending.resize(0);
-            return;
-        }
-        if (file.write(pending) != pending.size()) {
+        if (!failed && pending.size() > 0 && file.write(pending.data(), pending.size()) != pending.size()) {
             failed = true;
             error = file.errorString();
         }
-        pending.resize(0);
+        pending.clear();
+        lineStart = 0;
     }
 };
 
 namespace {
-void appendArgs(QString& out, const QVariantList& args)
-{
-    for (qsizetype i = 0; i < args.size(); ++i) {
-        if (i > 0)
-            out += QLatin1String(", ");
-        appendJournalValue(out, args[i]);
-    }
-}
-
-QString argList(const QVariantList& args)
-{
-    QString out;
-    appendArgs(out, args);
-    return out;
-}
-
-// Counts the time a journal call takes, formatting included.
-struct Timing {
-    explicit Timing(JournalProvider::Sink& sink) : sink(sink) { timer.start(); }
-    ~Timing() { sink.nanos += timer.nsecsElapsed(); }
-    JournalProvider::Sink& sink;
-    QElapsedTimer timer;
-};
-
 class JournalObject : public AutomationObject {
 public:
-    JournalObject(std::shared_ptr<JournalProvider::Sink> sink, QString path, bool root)
+    // path: the object's name as its lines start, in UTF-8.
+    JournalObject(std::shared_ptr<JournalProvider::Sink> sink, QByteArray path, bool root)
         : m_sink(std::move(sink))
         , m_path(std::move(path))
         , m_root(root)
@@ -204,23 +263,25 @@ public:
     ~JournalObject() override
     {
         if (m_root) {
-            m_sink->write(QStringLiteral("release ") + m_path);
+            m_sink->beginLine();
+            m_sink->pending.putAscii("release ");
+            m_sink->pending.putBytes(m_path);
+            m_sink->endLine();
             m_sink->flush();
         }
     }
 
     bool call(const QString& member, const QVariantList& args, QVariant* result, QString* error) override
     {
-        const Timing timing(*m_sink);
         // The line number is the answer; it is written with the line, so a
         // reader of the journal sees what each call returned.
         const qint64 next = m_sink->line + 1;
-        QString& line = startLine(member);
-        line += QLatin1Char('(');
-        appendArgs(line, args);
-        line += QLatin1String(") -> ");
-        appendInteger(line, next);
-        m_sink->write(line);
+        LineBuffer& out = startLine(member);
+        out.putAscii("(");
+        putArgs(out, args);
+        out.putAscii(") -> ");
+        out.putInteger(next);
+        m_sink->endLine();
         if (result)
             *result = QVariant(qlonglong(next));
         return ok(error);
@@ -228,36 +289,38 @@ public:
 
     std::shared_ptr<AutomationObject> object(const QString& member, const QVariantList& args, QString* error) override
     {
-        const Timing timing(*m_sink);
-        QString path = m_path + QLatin1Char('.') + member;
-        if (!args.isEmpty())
-            path += QLatin1Char('(') + argList(args) + QLatin1Char(')');
-        m_sink->write(path);
+        LineBuffer& out = startLine(member);
+        if (!args.isEmpty()) {
+            out.putAscii("(");
+            putArgs(out, args);
+            out.putAscii(")");
+        }
+        QByteArray path = m_sink->lineSoFar();
+        m_sink->endLine();
         if (!ok(error))
             return nullptr;
-        return std::make_shared<JournalObject>(m_sink, path, false);
+        return std::make_shared<JournalObject>(m_sink, std::move(path), false);
     }
 
     bool setProperty(const QString& name, const QVariant& value, QString* error) override
     {
-        const Timing timing(*m_sink);
-        QString& line = startLine(name);
-        line += QLatin1String(" = ");
-        appendJournalValue(line, value);
-        m_sink->write(line);
+        LineBuffer& out = startLine(name);
+        out.putAscii(" = ");
+        putValue(out, value);
+        m_sink->endLine();
         return ok(error);
     }
 
 private:
-    // "PATH.MEMBER" in the one line buffer, whose capacity stays between calls.
-    QString& startLine(const QString& member)
+    // A new line, "PATH.MEMBER" so far.
+    LineBuffer& startLine(const QString& member)
     {
-        QString& line = m_sink->text;
-        line.resize(0);
-        line += m_path;
-        line += QLatin1Char('.');
-        line += member;
-        return line;
+        m_sink->beginLine();
+        LineBuffer& out = m_sink->pending;
+        out.putBytes(m_path);
+        out.putAscii(".");
+        out.putText(member, false);
+        return out;
     }
 
     bool ok(QString* error) const
@@ -268,7 +331,7 @@ private:
     }
 
     std::shared_ptr<JournalProvider::Sink> m_sink;
-    QString m_path;
+    QByteArray m_path;
     bool m_root;
 };
 } // namespace
@@ -299,14 +362,15 @@ std::shared_ptr<AutomationObject> JournalProvider::create(const QString& progId,
                 ++m_sink->line;
             }
     }
-    m_sink->write(QStringLiteral("create ") + progId);
+    LineBuffer name;
+    name.putText(progId, false);
+    const QByteArray path(name.data(), name.size());
+    m_sink->beginLine();
+    m_sink->pending.putAscii("create ");
+    m_sink->pending.putBytes(path);
+    m_sink->endLine();
     m_sink->flush();
-    return std::make_shared<JournalObject>(m_sink, progId, true);
-}
-
-qint64 JournalProvider::writingNanoseconds() const
-{
-    return m_sink->nanos;
+    return std::make_shared<JournalObject>(m_sink, path, true);
 }
 
 } // namespace tagora

@@ -1,6 +1,5 @@
 #pragma once
 
-#include <QElapsedTimer>
 #include <QFile>
 #include <QString>
 #include <QVariant>
@@ -61,10 +60,6 @@ public:
     explicit JournalProvider(QString path);
     ~JournalProvider() override;
     std::shared_ptr<AutomationObject> create(const QString& progId, QString* error) override;
-
-    // Time spent formatting and writing lines, so a benchmark can tell the
-    // run's own cost from the journal's.
-    qint64 writingNanoseconds() const;
 
     struct Sink;
 

@@ -309,6 +309,22 @@ QVariant Statement::value(int i) const
     }
 }
 
+QString Statement::text(int i) const
+{
+    if (!m_stmt || i < 0 || i >= columnCount())
+        return QString();
+    switch (sqlite3_column_type(m_stmt, i)) {
+    case SQLITE_TEXT: {
+        // Text first, then its length: the engine's order for a valid length.
+        const auto* text = reinterpret_cast<const char*>(sqlite3_column_text(m_stmt, i));
+        return QString::fromUtf8(text, sqlite3_column_bytes(m_stmt, i));
+    }
+    case SQLITE_INTEGER: return QString::number(qlonglong(sqlite3_column_int64(m_stmt, i)));
+    case SQLITE_NULL: return QString();
+    default: return value(i).toString();
+    }
+}
+
 QVariant Statement::value(const QString& name) const
 {
     return value(columnIndex(name));

@@ -101,6 +101,9 @@ public:
     int columnIndex(const QString& name) const;
     QVariant value(int i) const;
     QVariant value(const QString& name) const;
+    // The value as text, the same as value(i).toString(), with no QVariant
+    // made for text, whole numbers or NULL (empty text).
+    QString text(int i) const;
     bool isNull(int i) const;
 
     const DbError& error() const { return m_error; }

@@ -254,6 +254,12 @@ private slots:
                                                        << p + "Open(\"פריט\", Null, True, 2.5) -> 2";
         QTest::newRow("beyond the basic plane") << "LabelSetVar" << QVariantList{"a\U0001F600b"} << false
                                                 << p + "LabelSetVar(\"a\U0001F600b\") -> 2";
+        // A lone surrogate is no character: the journal writes '?' for it, as Qt's encoder does.
+        QTest::newRow("lone surrogate") << "LabelSetVar" << QVariantList{QString("a") + QChar(0xD83D) + "\"b", QString(QChar(0xDE00))}
+                                        << false << p + "LabelSetVar(\"a?\\\"b\", \"?\") -> 2";
+        // Longer than the journal's buffer.
+        QTest::newRow("long text") << "LabelSetVar" << QVariantList{QString(70000, 'x')} << false
+                                   << p + "LabelSetVar(\"" + QString(70000, 'x') + "\") -> 2";
         QTest::newRow("property") << "LabelQty" << QVariantList{3} << true << p + "LabelQty = 3";
         QTest::newRow("text property") << "Name" << QVariantList{"50%"} << true << p + "Name = \"50%\"";
     }

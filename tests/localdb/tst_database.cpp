@@ -84,6 +84,24 @@ private slots:
         QCOMPARE(v.toVariant().toString(), QString::fromUtf8(text.toUtf8()));
     }
 
+    // A column read as text is what its value reads as, for every kind of
+    // value the engine holds; NULL is empty text.
+    void textOfValues()
+    {
+        Database db;
+        QVERIFY(!db.open(fresh("text.db"), Database::OpenMode::Create));
+        Statement sel = db.prepare("SELECT NULL, 0, -9223372036854775808, 42, 12.75, 0.1 + 0.2, 1e300, -0.0, 'שלום',"
+                                   " '', x'00ff41', x'', 'a' || char(0) || 'b'");
+        QCOMPARE(sel.step(), Statement::Step::Row);
+        for (int i = 0; i < sel.columnCount(); ++i)
+            QCOMPARE(sel.text(i), sel.value(i).toString());
+        QVERIFY(sel.text(0).isEmpty());
+        QCOMPARE(sel.text(3), QString("42"));
+        QCOMPARE(sel.text(8), QString::fromUtf8("שלום"));
+        QCOMPARE(sel.text(-1), QString());
+        QCOMPARE(sel.text(sel.columnCount()), QString());
+    }
+
     void keyViolations_data()
     {
         QTest::addColumn<QString>("second");
