@@ -419,17 +419,18 @@ ErpQuery familyRangeSql(const QString& fromSort, const QString& toSort)
 namespace {
 // The family range, then the restriction to the documents' items, then the order.
 ErpQuery withRange(ErpQuery q, const QString& fromSort, const QString& toSort, const QString& docCriteria,
-                   const QString& orderBy)
+                   const QString& orderBy, const ErpParams& docParams)
 {
     const ErpQuery range = familyRangeSql(fromSort, toSort);
     q.sql += range.sql + docCriteria + orderBy;
     q.params += range.params;
+    q.params += docParams;
     return q;
 }
 } // namespace
 
 ErpQuery itemQuerySql(const QString& fromSort, const QString& toSort, bool foreignNames, int priceList,
-                      bool withWarehouse, const QString& docCriteria)
+                      bool withWarehouse, const QString& docCriteria, const ErpParams& docParams)
 {
     const bool p = priceList != 0;
     ErpQuery q;
@@ -457,34 +458,35 @@ ErpQuery itemQuerySql(const QString& fromSort, const QString& toSort, bool forei
     }
     if (withWarehouse)
         sql += QStringLiteral(" AND PARTPARAM.PART = PART.PART AND PARTPARAM.WARHS = WAREHOUSES.WARHS");
-    return withRange(q, fromSort, toSort, docCriteria, QStringLiteral(" Order By PART.PARTNAME"));
+    return withRange(q, fromSort, toSort, docCriteria, QStringLiteral(" Order By PART.PARTNAME"), docParams);
 }
 
-ErpQuery foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria)
+ErpQuery foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria,
+                             const ErpParams& docParams)
 {
     return withRange({QStringLiteral("SELECT PART.PARTNAME, PARTDES.EPARTDES FROM PART, FAMILY, PARTDES"
                                      " WHERE (PART.TYPE = 'R' OR PART.TYPE = 'P') AND FAMILY.FAMILY = PART.FAMILY"
                                      " AND PARTDES.PART = PART.PART"),
                       {}},
-                     fromSort, toSort, docCriteria, QStringLiteral(" Order By PART.PARTNAME"));
+                     fromSort, toSort, docCriteria, QStringLiteral(" Order By PART.PARTNAME"), docParams);
 }
 
-ErpQuery alterKeyQuerySql(bool suppliers, const QString& docCriteria)
+ErpQuery alterKeyQuerySql(bool suppliers, const QString& docCriteria, const ErpParams& docParams)
 {
     if (suppliers)
         return {QStringLiteral("SELECT SUPPLIERS.SUPNAME, PART.PARTNAME, SUPPART.SUPPARTNAME"
                                " FROM SUPPLIERS, SUPPART, PART WHERE SUPPLIERS.SUP = SUPPART.SUP"
                                " AND PART.PART = SUPPART.PART")
                     + docCriteria,
-                {}};
+                docParams};
     return {QStringLiteral("SELECT CUSTOMERS.CUSTNAME, PART.PARTNAME, CUSTPART.CUSTPARTNAME"
                            " FROM CUSTOMERS, CUSTPART, PART WHERE CUSTOMERS.CUST = CUSTPART.CUST"
                            " AND PART.PART = CUSTPART.PART")
                 + docCriteria,
-            {}};
+            docParams};
 }
 
-ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria)
+ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria, const ErpParams& docParams)
 {
     return {QStringLiteral("SELECT CUSTOMERS.CUSTNAME As AccountKey, PART.PARTNAME As ItemKey"
                            ", CUSTPARTPRICE.PRICE, CURRENCIES.CODE As CurrencyCode"
@@ -493,20 +495,28 @@ ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria)
                            " AND CURRENCIES.CURRENCY = CUSTPARTPRICE.CURRENCY"
                            " AND CUSTPARTPRICE.EXPIRYDATE >= ? AND CUSTPARTPRICE.FROMDATE <= ?")
                 + docCriteria,
-            {today, today}};
+            ErpParams{today, today} + docParams};
 }
 
-ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria)
+ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria,
+                           const ErpParams& docParams)
 {
     return withRange({QStringLiteral("SELECT PARTPRICE.PLIST, PART.PARTNAME, PARTPRICE.PRICE, CURRENCIES.CODE"
                                      " FROM CURRENCIES, PARTPRICE, PART, FAMILY"
                                      " WHERE (PART.TYPE = 'R' OR PART.TYPE = 'P') AND CURRENCIES.CURRENCY = PARTPRICE.CURRENCY"
                                      " AND PARTPRICE.PART = PART.PART AND FAMILY.FAMILY = PART.FAMILY"),
                       {}},
-                     fromSort, toSort, docCriteria, QStringLiteral(" ORDER BY PARTPRICE.PLIST, PART.PARTNAME"));
+                     fromSort, toSort, docCriteria, QStringLiteral(" ORDER BY PARTPRICE.PLIST, PART.PARTNAME"),
+                     docParams);
 }
 
 namespace {
+// The values of the documents' criteria, when the reader runs by documents.
+ErpParams docParams(const ErpReadContext& ctx, bool byDocs)
+{
+    return byDocs ? ctx.itemByDocParams : ErpParams();
+}
+
 // The whole table as progress's basis when nothing restricts the run.
 ProgressBasis basisFor(const QString& table, bool restricted)
 {
@@ -520,7 +530,7 @@ bool ReadItemPriority(const ErpReadContext& ctx, const QString& dbPath, const QS
 {
     ReaderRun run(ctx, QStringLiteral("קורא פריטים"), QStringLiteral("Error reading item: "), kItemTimeout);
     const ErpQuery sql = itemQuerySql(fromSort, toSort, foreignNames, priceList, withWarehouse,
-                                     byDocs ? ctx.itemByDocCriteria : QString());
+                                     byDocs ? ctx.itemByDocCriteria : QString(), docParams(ctx, byDocs));
     if (!run.start(dbPath, sql, error, basisFor(QStringLiteral("PART"), byDocs || !fromSort.isEmpty() || !toSort.isEmpty())))
         return false;
     // Found by key and updated, or added; a field the ERP leaves empty keeps
@@ -586,7 +596,7 @@ bool ReadItemFName(const ErpReadContext& ctx, const QString& dbPath, const QStri
                    bool byDocs, ReadError* error)
 {
     ReaderRun run(ctx, QStringLiteral("קורא תאורים לועזיים"), QStringLiteral("Error reading item: "), kItemTimeout);
-    if (!run.start(dbPath, foreignNameQuerySql(fromSort, toSort, byDocs ? ctx.itemByDocCriteria : QString()), error,
+    if (!run.start(dbPath, foreignNameQuerySql(fromSort, toSort, byDocs ? ctx.itemByDocCriteria : QString(), docParams(ctx, byDocs)), error,
                    basisFor(QStringLiteral("PARTDES"), byDocs || !fromSort.isEmpty() || !toSort.isEmpty())))
         return false;
     const bool ok = run.prepare(QStringLiteral("UPDATE tItems SET Fname = ?2 WHERE ItemKey = ?1"), error, {0},
@@ -608,7 +618,7 @@ bool readAlterKeys(const ErpReadContext& ctx, const QString& dbPath, bool byDocs
                    bool suppliers, ReadError* error)
 {
     ReaderRun run(ctx, QStringLiteral("קורא מפתחות חליפיים"), QStringLiteral("Error reading alter key: "), kOtherTimeout);
-    if (!run.start(dbPath, alterKeyQuerySql(suppliers, byDocs ? ctx.itemByDocCriteria : QString()), error,
+    if (!run.start(dbPath, alterKeyQuerySql(suppliers, byDocs ? ctx.itemByDocCriteria : QString(), docParams(ctx, byDocs)), error,
                    basisFor(suppliers ? QStringLiteral("SUPPART") : QStringLiteral("CUSTPART"), byDocs)))
         return false;
     const bool ok = run.prepare(
@@ -652,7 +662,7 @@ bool ReadAlterPricePRIORITY(const ErpReadContext& ctx, const QString& dbPath, bo
                             ReadError* error)
 {
     ReaderRun run(ctx, QStringLiteral("קורא מחירים מיוחדים"), QStringLiteral("Error reading alter price: "), kOtherTimeout);
-    const ErpQuery sql = alterPriceQuerySql(DateToErp(QVariant(ctx.today)), byDocs ? ctx.itemByDocCriteria : QString());
+    const ErpQuery sql = alterPriceQuerySql(DateToErp(QVariant(ctx.today)), byDocs ? ctx.itemByDocCriteria : QString(), docParams(ctx, byDocs));
     // Counted exactly: the day's window may leave out most of the table.
     if (!run.start(dbPath, sql, error))
         return false;
@@ -687,7 +697,7 @@ bool ReadPriceListPriority(const ErpReadContext& ctx, const QString& dbPath, con
                            const QString& toSort, bool byDocs, const QString& table, ReadError* error)
 {
     ReaderRun run(ctx, QStringLiteral("קורא מחירונים"), QStringLiteral("Error with price list: "), kOtherTimeout);
-    if (!run.start(dbPath, priceListQuerySql(fromSort, toSort, byDocs ? ctx.itemByDocCriteria : QString()), error,
+    if (!run.start(dbPath, priceListQuerySql(fromSort, toSort, byDocs ? ctx.itemByDocCriteria : QString(), docParams(ctx, byDocs)), error,
                    basisFor(QStringLiteral("PARTPRICE"), byDocs || !fromSort.isEmpty() || !toSort.isEmpty())))
         return false;
     const bool ok = run.prepare(

@@ -21,6 +21,8 @@ struct ErpReadContext {
     QDate today = QDate::currentDate();
     // Seconds each reader's ERP operation may take; 0 keeps the reader's own.
     int timeout = 0;
+    // The values of the "?" markers of itemByDocCriteria, in order.
+    ErpParams itemByDocParams;
 };
 
 // A reader's failure: the title names the row being read when it failed.
@@ -67,13 +69,16 @@ QVector<PriceField> ReadPriceFields(const QString& connString, QString* error);
 // The queries the readers send: range bounds, the price-list number and the
 // day go in as values, never as SQL text; the criteria of the documents'
 // items are SQL of their own.
+// docParams are the values of the criteria's own "?" markers.
 ErpQuery itemQuerySql(const QString& fromSort, const QString& toSort, bool foreignNames, int priceList,
-                      bool withWarehouse, const QString& docCriteria);
-ErpQuery foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria);
-ErpQuery alterKeyQuerySql(bool suppliers, const QString& docCriteria);
+                      bool withWarehouse, const QString& docCriteria, const ErpParams& docParams = {});
+ErpQuery foreignNameQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria,
+                             const ErpParams& docParams = {});
+ErpQuery alterKeyQuerySql(bool suppliers, const QString& docCriteria, const ErpParams& docParams = {});
 // today: the day as the ERP keeps it (DateToErp: a date, or minutes for connection type 2).
-ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria);
-ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria);
+ErpQuery alterPriceQuerySql(const QVariant& today, const QString& docCriteria, const ErpParams& docParams = {});
+ErpQuery priceListQuerySql(const QString& fromSort, const QString& toSort, const QString& docCriteria,
+                           const ErpParams& docParams = {});
 ErpQuery familyRangeSql(const QString& fromSort, const QString& toSort);
 
 } // namespace tagora
