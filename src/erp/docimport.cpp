@@ -702,10 +702,12 @@ DocImportResult ImportDocuments(const ErpReadContext& ctx, const DocImportOption
         const qint64 read = ReadStockPriority(ctx, result.tempDocsPath, type, fromDate, toDate, type.includeDraft,
                                               o, state, &error);
         if (read == 0) {
-            // The type's documents are left out; the others are still read.
             if (error.message.isEmpty())
                 error.message = QStringLiteral("קריאת המסמכים נכשלה");
             result.errors.push_back(error);
+            // A cancel ends the run; a failing type leaves the others to be read.
+            if (ctx.progress && ctx.progress->cancelRequested())
+                return result;
             continue;
         }
         if (o.readDocItems && itemsStep) {

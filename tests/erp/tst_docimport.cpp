@@ -378,6 +378,32 @@ private slots:
                  QStringList{advances ? last + "|" + QString::number(last.toLongLong() + 1) : QStringLiteral("0|0")});
     }
 
+    // Drafts are left out unless the type takes them; a type included for
+    // its drafts alone is not read.
+    void drafts_data()
+    {
+        QTest::addColumn<bool>("include");
+        QTest::addColumn<bool>("includeDraft");
+        QTest::addColumn<QString>("where");
+        QTest::newRow("final only") << true << false << "FINAL = 'Y'";
+        QTest::newRow("with drafts") << true << true << "1";
+        QTest::newRow("drafts alone") << false << true << "0";
+    }
+    void drafts()
+    {
+        QFETCH(bool, include);
+        QFETCH(bool, includeDraft);
+        QFETCH(QString, where);
+        const QString folder = newFolder(QStringLiteral("3"));
+        QVERIFY(!execOn(config(folder), QStringLiteral("UPDATE tDocTypes SET Include = %1, IncludeDraft = %2 WHERE DocType = 3")
+                                            .arg(include ? 1 : 0)
+                                            .arg(includeDraft ? 1 : 0)));
+        const DocImportResult r = import(folder, {});
+        QVERIFY2(r.completed && r.errors.isEmpty(), qPrintable(r.errors.value(0).message));
+        QCOMPARE(rows(docs(folder), QStringLiteral("SELECT Number FROM tTempDocHeaders ORDER BY Number")),
+                 rows(erp2, QStringLiteral("SELECT DOC FROM DOCUMENTS WHERE TYPE = 'D' AND %1 ORDER BY DOC").arg(where)));
+    }
+
     // A number longer than its local field is kept whole.
     void longNumberKeptWhole()
     {
@@ -526,6 +552,59 @@ private slots:
         QStringList expected{partName(6), partName(7), partName(8)};
         expected.sort();
         QCOMPARE(names, expected);
+    }
+
+    // With the related items asked for, each type's items are read by its
+    // documents' criteria; a step that fails ends the run.
+    void relatedItems_data()
+    {
+        QTest::addColumn<bool>("stepSucceeds");
+        QTest::newRow("items read") << true;
+        QTest::newRow("items failed") << false;
+    }
+    void relatedItems()
+    {
+        QFETCH(bool, stepSucceeds);
+        const QString folder = newFolder(QStringLiteral("1"));
+        DocImportOptions o = numbers(QStringLiteral("0001"), QStringLiteral("0003"), QStringLiteral("ZB-"));
+        o.readDocItems = true;
+        o.dataFolder = folder;
+        const ErpReadContext base{BuildConnString(kDsn2, "sa", QVariant(), "demo", 2)};
+        int steps = 0;
+        const QString tempItems = QDir(folder).filePath(dbfiles::TempItems);
+        const DocImportResult r = ImportDocuments(base, o, nullptr, [&](const DocTypeRecipe& type, const DocCriteriaState& state) {
+            ++steps;
+            ErpReadContext ctx = base;
+            ctx.itemByDocCriteria = state.currentItemByDocCriteria.sql;
+            ctx.itemByDocParams = state.currentItemByDocCriteria.params;
+            ReadError error;
+            const bool ok = ReadItemPriority(ctx, tempItems, {}, {}, false, 1, 0, true, false, &error);
+            return ok && type.docType == 1 && stepSucceeds;
+        });
+        QCOMPARE(steps, 1);
+        QCOMPARE(r.completed, stepSucceeds);
+        QCOMPARE(r.tempItemsPath, tempItems);
+        if (stepSucceeds) {
+            QStringList expected{partName(6), partName(7), partName(8)};
+            expected.sort();
+            QCOMPARE(rows(QDir(folder).filePath(dbfiles::Items), QStringLiteral("SELECT ItemKey FROM tItems ORDER BY ItemKey")),
+                     expected);
+        }
+    }
+
+    // A cancel ends the run with nothing of the type kept.
+    void cancel()
+    {
+        struct Cancelling : Recorder {
+            bool cancelRequested() override { return true; }
+        } sink;
+        const QString folder = newFolder(QStringLiteral("1, 3"));
+        const DocImportResult r = import(folder, {}, 2, &sink);
+        QVERIFY(!r.completed);
+        QCOMPARE(r.errors.size(), 1);
+        QCOMPARE(scalar(docs(folder), QStringLiteral("SELECT count(*) FROM tTempDocHeaders")).toInt(), 0);
+        QCOMPARE(rows(config(folder), QStringLiteral("SELECT count(*) FROM tWizFileRanges WHERE FromIndx > 0")),
+                 QStringList{"0"});
     }
 
     // The import only reads the ERP.
