@@ -1,5 +1,6 @@
 #pragma once
 
+#include "erp/odbc.h"
 #include "platform/progress.h"
 #include "platform/services.h"
 
@@ -22,6 +23,7 @@ namespace tagora {
 
 class CommonDialog;
 struct ReadError;
+struct ErpReadContext;
 struct CaselessKeysReport;
 
 // What the control hands to a dialog before it opens it.
@@ -194,6 +196,8 @@ private:
     void showDialog(const QString& formName);
     int runDialog(QDialog& dialog);
     bool reportRead(bool ok, const ReadError& error);
+    // A reader's context that carries the current documents' item criteria.
+    ErpReadContext docReadContext(const QString& conn);
     int priceListNumber() const;
 
     std::unique_ptr<Ui::MainCardForm> ui;
@@ -207,7 +211,7 @@ private:
     CancellableWork* m_work = nullptr;
     // Set by each document import for the item readers that run by documents.
     QString m_currentDocCriteria;
-    QString m_currentItemByDocCriteria;
+    ErpQuery m_currentItemByDocCriteria;
     // Whether this control has read the direct-label layout from the store.
     bool m_layoutLoaded = false;
     // Set when a write to the settings store failed since the save began, so

@@ -4,6 +4,7 @@
 
 #include "dialogs/frmlogon.h"
 #include "erp/connparams.h"
+#include "erp/docimport.h"
 #include "erp/itemimport.h"
 #include "erp/odbc.h"
 #include "localdb/schema.h"
@@ -12,6 +13,7 @@
 
 #include "ui_maincard.h"
 
+#include <QCheckBox>
 #include <QCoreApplication>
 #include <QElapsedTimer>
 #include <QFileInfo>
@@ -87,7 +89,7 @@ short MainCard::ReadItemPriority(const QString& CompPath, const QString& pDBPath
                                  bool /*pImportPackUnits*/, bool pByDocs, bool pWithWhouseData)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(reportRead(tagora::ReadItemPriority(ctx, pDBPath, text(pFromItemSort), text(pToItemSort),
                                                          GetForeign != 0, pCopies, pPriceField, pByDocs,
                                                          pWithWhouseData, &e),
@@ -98,7 +100,7 @@ short MainCard::ReadItemFName(const QString& CompPath, const QString& pDBPath, c
                               const QVariant& pToItemSort, bool pByDocs)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(
         reportRead(tagora::ReadItemFName(ctx, pDBPath, text(pFromItemSort), text(pToItemSort), pByDocs, &e), e));
 }
@@ -107,7 +109,7 @@ short MainCard::ReadAlterKeyPRIORITY(const QString& CompPath, const QString& pDB
                                      const QVariant&, bool pByDocs, const QString& pTableName)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(reportRead(tagora::ReadAlterKeyPRIORITY(ctx, pDBFullName, pByDocs, pTableName, &e), e));
 }
 
@@ -115,7 +117,7 @@ short MainCard::ReadAlterKeySupPRIORITY(const QString& CompPath, const QString& 
                                         const QVariant&, bool pByDocs, const QString& pTableName)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(reportRead(tagora::ReadAlterKeySupPRIORITY(ctx, pDBFullName, pByDocs, pTableName, &e), e));
 }
 
@@ -123,7 +125,7 @@ short MainCard::ReadAlterPricePRIORITY(const QString& CompPath, const QString& p
                                        const QVariant&, bool pByDocs, const QString& pTableName)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(reportRead(tagora::ReadAlterPricePRIORITY(ctx, pDBFullName, pByDocs, pTableName, &e), e));
 }
 
@@ -132,7 +134,7 @@ short MainCard::ReadPriceListPriority(const QString& CompPath, const QString& pD
                                       const QString& pTableName)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(reportRead(tagora::ReadPriceListPriority(ctx, pDBFullName, text(pFromItemSort),
                                                               text(pToItemSort), pByDocs, pTableName, &e),
                                e));
@@ -141,7 +143,7 @@ short MainCard::ReadPriceListPriority(const QString& CompPath, const QString& pD
 short MainCard::ReadPriceListNamePriority(const QString& CompPath, const QString& pDBPath)
 {
     ReadError e;
-    const ErpReadContext ctx{CompPath, this, m_currentItemByDocCriteria};
+    const ErpReadContext ctx = docReadContext(CompPath);
     return fromBool(reportRead(tagora::ReadPriceListNamePriority(ctx, pDBPath, &e), e));
 }
 
@@ -158,47 +160,6 @@ QString MainCard::BuildItemByDocCriteria(const QString& HeadTable, const QString
         + HeadTable + QStringLiteral(", ") + LineTable + QStringLiteral(" WHERE ") + LineTable + QLatin1Char('.')
         + FldID + QStringLiteral(" = ") + HeadTable + QLatin1Char('.') + FldID + m_currentDocCriteria
         + QLatin1Char(')');
-}
-
-short MainCard::ImportItemsByDocs(const QString& WizPath, const QString& MyDBName, const QVariant& pFromItemKey,
-                                  const QVariant& pToItemKey, short UseFName, short pCopies, int pPriceField,
-                                  bool pImportPackUnits, bool)
-{
-    setMessage(QStringLiteral("קורא פריטים..."));
-    if (!ReadItemPriority(WizPath, MyDBName, pFromItemKey, pToItemKey, UseFName, pCopies, pPriceField,
-                          pImportPackUnits, true, ui->chkReadItemParam->isChecked()))
-        return 0;
-    setMessage(QStringLiteral("קורא שמות לועזיים..."));
-    if (!ReadItemFName(WizPath, MyDBName, pFromItemKey, pToItemKey, true))
-        return 0;
-    if (ui->ChkImportAlterKeys->isChecked()) {
-        setMessage(QStringLiteral("קורא מפתחות חליפיים..."));
-        if (!ReadAlterKeyPRIORITY(WizPath, MyDBName, pFromItemKey, pToItemKey, true, QStringLiteral("tTempAlterKeys")))
-            return 0;
-    }
-    if (ui->ChkImportAlterPrices->isChecked()) {
-        setMessage(QStringLiteral("קורא מחירים מיוחדים..."));
-        if (!ReadAlterPricePRIORITY(WizPath, MyDBName, pFromItemKey, pToItemKey, true,
-                                    QStringLiteral("tTempAlterPrices")))
-            return 0;
-    }
-    if (ui->chkReadPriceList->isChecked()) {
-        setMessage(QStringLiteral("קורא את המחירונים הנדרשים..."));
-        return ReadPriceListPriority(WizPath, MyDBName, pFromItemKey, pToItemKey, true, QStringLiteral("tTempPriceList"));
-    }
-    return -1;
-}
-
-// ------------------------------------------------------------ the commands
-
-void MainCard::CmdConnect_Click()
-{
-    m_shared.dataFolder = ui->txtDBPath->text();
-    FrmLogon dialog(m_services, this);
-    const bool connected = runDialog(dialog) == QDialog::Accepted;
-    UserControl_InitProperties();
-    if (connected)
-        RefillErpLists();
 }
 
 // Long work on the screen's own thread: between rows the readers ask whether
@@ -263,6 +224,115 @@ bool MainCard::cancelRequested()
     return m_work && m_work->cancelRequested();
 }
 
+ErpReadContext MainCard::docReadContext(const QString& conn)
+{
+    ErpReadContext ctx{conn, this, m_currentItemByDocCriteria.sql};
+    ctx.itemByDocParams = m_currentItemByDocCriteria.params;
+    return ctx;
+}
+
+void MainCard::UpdateDocsAlterKeys(const QString& pDBName)
+{
+    QString error;
+    if (!tagora::UpdateDocsAlterKeys(pDBName, &error))
+        m_services.prompt->critical(titles::Fault, error);
+}
+
+void MainCard::ImportDocuments()
+{
+    DocImportOptions o;
+    o.dataFolder = ui->txtDBPath->text();
+    o.fromDate = ui->txtFromDate->text();
+    o.toDate = ui->txtToDate->text();
+    o.fromDocNum = ui->txtFromDocNum->text();
+    o.toDocNum = ui->txtToDocNum->text();
+    o.refPref = ui->txtRefPref->text();
+    o.qtyFrom = ui->cmbQtyFrom->currentIndex();
+    o.qtyFactor = ui->txtQtyFactor->text();
+    o.onlyLine0 = ui->chkOnlyLine0->isChecked();
+    o.readDocItems = ui->chkReadDocItems->isChecked();
+    if (auto* send = control<QCheckBox>(QStringLiteral("ChkFldSend(17)")))
+        o.withExport = send->isChecked();
+
+    if (const DbError e = PrepareDataFolder(o.dataFolder)) {
+        m_services.prompt->critical(titles::Fault, e.message);
+        return;
+    }
+    if (!caselessKeys(dataFile(dbfiles::Items)))
+        return;
+    const QString conn = currentConnString();
+    const QString tempItems = dataFile(dbfiles::TempItems);
+    bool copiesOk = false;
+    const double copiesValue = ui->txtCopies->text().trimmed().toDouble(&copiesOk);
+    const short copies = copiesOk && copiesValue >= -32768 && copiesValue <= 32767 ? short(std::nearbyint(copiesValue)) : 0;
+    const short foreign = ui->CmbItemNameType->currentIndex() == 1 ? -1 : 0;
+
+    // The items of each type's documents, read with that type's criteria; a
+    // failure asks whether the documents alone are worth going on with.
+    const DocItemsStep items = [&](const DocTypeRecipe&, const DocCriteriaState& state) {
+        m_currentDocCriteria = state.currentDocCriteria.sql;
+        m_currentItemByDocCriteria = state.currentItemByDocCriteria;
+        if (ImportItemsByDocs(conn, tempItems, ui->txtFromItemSort->text(), ui->txtToItemSort->text(), foreign, copies,
+                              priceListNumber(), true, true)
+            != 0)
+            return true;
+        return m_services.prompt->ask(PromptIcon::Question, titles::Attention, QStringLiteral("להמשיך בכל זאת?"));
+    };
+    DocCriteriaState state;
+    DocImportResult result;
+    {
+        CancellableWork work(this);
+        result = tagora::ImportDocuments(ErpReadContext{conn, this}, o, &state, items);
+    }
+    m_currentDocCriteria = state.currentDocCriteria.sql;
+    m_currentItemByDocCriteria = state.currentItemByDocCriteria;
+    for (const ReadError& e : result.errors)
+        m_services.prompt->critical(e.title, e.message);
+    if (result.completed)
+        cmdSelectDocItems_Click();
+}
+
+short MainCard::ImportItemsByDocs(const QString& WizPath, const QString& MyDBName, const QVariant& pFromItemKey,
+                                  const QVariant& pToItemKey, short UseFName, short pCopies, int pPriceField,
+                                  bool pImportPackUnits, bool)
+{
+    setMessage(QStringLiteral("קורא פריטים..."));
+    if (!ReadItemPriority(WizPath, MyDBName, pFromItemKey, pToItemKey, UseFName, pCopies, pPriceField,
+                          pImportPackUnits, true, ui->chkReadItemParam->isChecked()))
+        return 0;
+    setMessage(QStringLiteral("קורא שמות לועזיים..."));
+    if (!ReadItemFName(WizPath, MyDBName, pFromItemKey, pToItemKey, true))
+        return 0;
+    if (ui->ChkImportAlterKeys->isChecked()) {
+        setMessage(QStringLiteral("קורא מפתחות חליפיים..."));
+        if (!ReadAlterKeyPRIORITY(WizPath, MyDBName, pFromItemKey, pToItemKey, true, QStringLiteral("tTempAlterKeys")))
+            return 0;
+    }
+    if (ui->ChkImportAlterPrices->isChecked()) {
+        setMessage(QStringLiteral("קורא מחירים מיוחדים..."));
+        if (!ReadAlterPricePRIORITY(WizPath, MyDBName, pFromItemKey, pToItemKey, true,
+                                    QStringLiteral("tTempAlterPrices")))
+            return 0;
+    }
+    if (ui->chkReadPriceList->isChecked()) {
+        setMessage(QStringLiteral("קורא את המחירונים הנדרשים..."));
+        return ReadPriceListPriority(WizPath, MyDBName, pFromItemKey, pToItemKey, true, QStringLiteral("tTempPriceList"));
+    }
+    return -1;
+}
+
+// ------------------------------------------------------------ the commands
+
+void MainCard::CmdConnect_Click()
+{
+    m_shared.dataFolder = ui->txtDBPath->text();
+    FrmLogon dialog(m_services, this);
+    const bool connected = runDialog(dialog) == QDialog::Accepted;
+    UserControl_InitProperties();
+    if (connected)
+        RefillErpLists();
+}
+
 void MainCard::ImportItems()
 {
     if (ui->ChkCleanAlterKeys->isChecked()
@@ -319,7 +389,7 @@ void MainCard::ImportItems()
     setMessage(QStringLiteral("קורא פריטים..."));
     {
         ReadError readError;
-        const ErpReadContext ctx{conn, this, m_currentItemByDocCriteria};
+        const ErpReadContext ctx = docReadContext(conn);
         if (!reportRead(tagora::ReadItemPriority(ctx, itemsDb, fromSort, toSort, foreign != 0, copies, priceList,
                                                  false, ui->chkReadItemParam->isChecked(), &readError, cleanItems),
                         readError))

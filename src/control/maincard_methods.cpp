@@ -41,13 +41,9 @@ int MainCard::ReadStockPriority(const QString&, const QString&, short, const QVa
 
 void MainCard::CreateListFile(const QString&, const QString&, uchar, uchar) {}
 
-void MainCard::UpdateDocsAlterKeys(const QString&) {}
-
 // ---- hooks
 
 void MainCard::ShowItemList(uchar, const QString&) {}
-
-void MainCard::ImportDocuments() {}
 
 void MainCard::PrintFromLabelList() {}
 
