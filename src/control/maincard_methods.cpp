@@ -51,8 +51,6 @@ void MainCard::ImportDocuments() {}
 
 void MainCard::PrintFromLabelList() {}
 
-void MainCard::showDialog(const QString&) {}
-
 void MainCard::showItemCard(const QString&, bool) {}
 
 } // namespace tagora

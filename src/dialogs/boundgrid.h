@@ -65,6 +65,13 @@ public:
     // Writes one field of many rows in one transaction; false when it failed
     // (nothing written then).
     bool setField(const QVector<int>& rows, const QString& field, const QVariant& value);
+    // The same for every row shown that holds another value; true when there
+    // was nothing to write.
+    bool setFieldInAllRows(const QString& field, const QVariant& value);
+    // Shows no rows, keeping the query: for a list whose rows belong to
+    // something no longer there, which must not go on showing (or taking
+    // marks for) what it showed before.
+    void clearRows();
 
     int rowCount(const QModelIndex& parent = QModelIndex()) const override;
     int columnCount(const QModelIndex& parent = QModelIndex()) const override;
