@@ -338,6 +338,12 @@ void BoundGrid::sizeColumns()
     }
 }
 
+void BoundGrid::stretchColumn(int column)
+{
+    horizontalHeader()->setStretchLastSection(false);
+    horizontalHeader()->setSectionResizeMode(column, QHeaderView::Stretch);
+}
+
 QString BoundGrid::text(int row, int column) const
 {
     if (!m_model || row < 0 || row >= m_model->rowCount() || column < 0 || column >= m_model->columnCount())

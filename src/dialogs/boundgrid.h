@@ -113,6 +113,9 @@ public:
     int currentRowIndex() const;
     void setCurrentRowIndex(int row, int column = 1);
     void sizeColumns();
+    // The column that takes the width the others leave, in place of the last
+    // one: a wide check box column reads badly when its box sits far from its title.
+    void stretchColumn(int column);
     // The cell's text as the grid shows it.
     QString text(int row, int column) const;
 

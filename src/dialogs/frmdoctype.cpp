@@ -26,6 +26,7 @@ FrmDocType::FrmDocType(const QString& dataFolder, std::shared_ptr<Prompt> prompt
                         boundColumn(QStringLiteral("Include"), QStringLiteral("לשאוב?"), K::Check, true),
                         boundColumn(QStringLiteral("IncludeDraft"), QStringLiteral("טיוטות?"), K::Check, true)});
     ui->VSDocTypes->setBoundModel(m_model);
+    ui->VSDocTypes->stretchColumn(1);
     ui->VSDocTypes->setColumnHidden(0, true);
     connect(m_model, &BoundTableModel::writeFailed, this,
             [this](const QString& message) { m_prompt->critical(titles::Error, message); });

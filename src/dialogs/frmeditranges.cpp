@@ -35,6 +35,7 @@ FrmEditRanges::FrmEditRanges(const QString& dataFolder, std::shared_ptr<Prompt> 
                         movement("LastIndx", QStringLiteral("תנועה אחרונה שנמשכה")),
                         movement("FromIndx", QStringLiteral("משיכה הבאה החל מתנועה"))});
     ui->VSEditRange->setBoundModel(m_model);
+    ui->VSEditRange->stretchColumn(1);
     ui->VSEditRange->setColumnHidden(0, true);
     connect(m_model, &BoundTableModel::writeFailed, this,
             [this](const QString& message) { m_prompt->critical(titles::Error, message); });

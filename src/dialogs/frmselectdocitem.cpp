@@ -89,6 +89,7 @@ FrmSelectDocItem::FrmSelectDocItem(const QString& dataFolder, ControlCommands* c
                         boundColumn(QStringLiteral("Warehouse"), QStringLiteral("מחסן"), K::Number), copies,
                         boundColumn(QStringLiteral("Include"), QStringLiteral("להדפיס?"), K::Check, true)});
     ui->VSDocLines->setBoundModel(m_lines);
+    ui->VSDocLines->stretchColumn(3);
 
     // A value typed into a cell and refused (or not written) is said at once;
     // the cell keeps what the file holds.
