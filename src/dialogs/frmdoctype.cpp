@@ -13,7 +13,6 @@ FrmDocType::FrmDocType(const QString& dataFolder, std::shared_ptr<Prompt> prompt
     : QDialog(parent)
     , ui(std::make_unique<Ui::FrmDocTypeForm>())
     , m_model(new BoundTableModel(this))
-    , m_dataFolder(dataFolder)
     , m_prompt(prompt ? std::move(prompt) : std::make_shared<MessageBoxPrompt>(this))
 {
     ui->setupUi(this);

@@ -30,7 +30,6 @@ private:
 
     std::unique_ptr<Ui::FrmDocTypeForm> ui;
     BoundTableModel* m_model;
-    QString m_dataFolder;
     std::shared_ptr<Prompt> m_prompt;
 };
 
