@@ -406,6 +406,9 @@ private:
                           : model->data(index, Qt::DisplayRole).toString());
                 return;
             }
+            // Typing into a cell moves there first, as a user's click does: a
+            // grid that follows its current row (documents and their lines) follows it.
+            view->setCurrentIndex(index);
             const bool ok = check ? model->setData(index, value.toInt() != 0 ? Qt::Checked : Qt::Unchecked, Qt::CheckStateRole)
                                   : model->setData(index, value, Qt::EditRole);
             if (!ok)

@@ -1,6 +1,9 @@
 #include "control/maincard.h"
 
 #include "control/settingstable.h"
+#include "dialogs/frmdoctype.h"
+#include "dialogs/frmeditranges.h"
+#include "dialogs/frmselectdocitem.h"
 #include "dialogs/frmselectitem.h"
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
@@ -697,6 +700,21 @@ void MainCard::cmdLabDesign_Click()
     m_shared.dataFolder = ui->txtDBPath->text();
     m_shared.objectRef = this;
     showDialog(QStringLiteral("frmLabDef"));
+}
+
+// The dialogs that take only the shared state, by their form names. A name
+// without a dialog yet opens nothing.
+void MainCard::showDialog(const QString& formName)
+{
+    std::unique_ptr<QDialog> dialog;
+    if (formName == QLatin1String("frmDocType"))
+        dialog = std::make_unique<FrmDocType>(m_shared.dataFolder, m_services.prompt, this);
+    else if (formName == QLatin1String("frmEditRanges"))
+        dialog = std::make_unique<FrmEditRanges>(m_shared.dataFolder, m_services.prompt, this);
+    else if (formName == QLatin1String("frmSelectDocItem"))
+        dialog = std::make_unique<FrmSelectDocItem>(m_shared.dataFolder, this, m_services.prompt, this);
+    if (dialog)
+        runDialog(*dialog);
 }
 
 void MainCard::CmdImportItems_Click()

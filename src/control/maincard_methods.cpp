@@ -47,8 +47,6 @@ void MainCard::ShowItemList(uchar, const QString&) {}
 
 void MainCard::PrintFromLabelList() {}
 
-void MainCard::showDialog(const QString&) {}
-
 void MainCard::showItemCard(const QString&, bool) {}
 
 } // namespace tagora

@@ -251,6 +251,27 @@ bool BoundTableModel::setField(const QVector<int>& rows, const QString& field, c
     return true;
 }
 
+bool BoundTableModel::setFieldInAllRows(const QString& field, const QVariant& value)
+{
+    const int f = fieldIndex(field);
+    if (f < 0)
+        return false;
+    QVector<int> rows;
+    for (int row = 0; row < m_rows.size(); ++row)
+        if (m_rows[row][f].isNull() || m_rows[row][f] != value)
+            rows << row;
+    return rows.isEmpty() || setField(rows, field, value);
+}
+
+void BoundTableModel::clearRows()
+{
+    if (m_rows.isEmpty())
+        return;
+    beginResetModel();
+    m_rows.clear();
+    endResetModel();
+}
+
 QVariant BoundTableModel::headerData(int section, Qt::Orientation orientation, int role) const
 {
     if (orientation == Qt::Horizontal && role == Qt::DisplayRole && section >= 0 && section < m_columns.size())
@@ -315,6 +336,12 @@ void BoundGrid::sizeColumns()
         else
             resizeColumnToContents(c);
     }
+}
+
+void BoundGrid::stretchColumn(int column)
+{
+    horizontalHeader()->setStretchLastSection(false);
+    horizontalHeader()->setSectionResizeMode(column, QHeaderView::Stretch);
 }
 
 QString BoundGrid::text(int row, int column) const

@@ -65,6 +65,13 @@ public:
     // Writes one field of many rows in one transaction; false when it failed
     // (nothing written then).
     bool setField(const QVector<int>& rows, const QString& field, const QVariant& value);
+    // The same for every row shown that holds another value; true when there
+    // was nothing to write.
+    bool setFieldInAllRows(const QString& field, const QVariant& value);
+    // Shows no rows, keeping the query: for a list whose rows belong to
+    // something no longer there, which must not go on showing (or taking
+    // marks for) what it showed before.
+    void clearRows();
 
     int rowCount(const QModelIndex& parent = QModelIndex()) const override;
     int columnCount(const QModelIndex& parent = QModelIndex()) const override;
@@ -106,6 +113,9 @@ public:
     int currentRowIndex() const;
     void setCurrentRowIndex(int row, int column = 1);
     void sizeColumns();
+    // The column that takes the width the others leave, in place of the last
+    // one: a wide check box column reads badly when its box sits far from its title.
+    void stretchColumn(int column);
     // The cell's text as the grid shows it.
     QString text(int row, int column) const;
 

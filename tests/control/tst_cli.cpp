@@ -169,6 +169,52 @@ private slots:
         QCOMPARE(runCli(settings(), open + QStringList{"getcell", "VSSelectItems", "1", "3"}).out.last(), QString("1"));
     }
 
+    // The document road's dialogs, scripted: types ticked, ranges reset,
+    // a document's lines cleared and copies typed, each stored in its file.
+    void scriptedDocumentDialogs()
+    {
+        const QString data = dir.filePath("docdialogs");
+        QVERIFY(!PrepareDataFolder(data));
+        const QString docs = data + "/" + dbfiles::TempDocs;
+        DbError e;
+        QVERIFY(!CreateTempDocsDB(data + "/" + dbfiles::Config, data + "/" + dbfiles::Items, docs, &e).isEmpty());
+        QVERIFY(!execOn(docs, "INSERT INTO tTempDocHeaders (WizFileID, Number, DocType, Reference1, DocDate, Include) VALUES"
+                              " (2, 7, 1, 'SO7', '2026-02-03T00:00:00', 1), (2, 8, 1, 'SO8', '2026-02-04', 1);"
+                              "INSERT INTO tTempDocLines (WizFileID, HeadNumber, LineNum, ItemKey, Copies, Include) VALUES"
+                              " (2, 7, 1, 'A', 1, 1), (2, 8, 1, 'B', 1, 1), (2, 8, 2, 'C', 1, 1)"));
+        QVERIFY(!execOn(data + "/" + dbfiles::Config, "UPDATE tWizFileRanges SET FromIndx = 50, LastIndx = 49"));
+        const QByteArray script = "click CmdDocType\n"
+                                  "  setcell VSDocTypes 2 2 1\n"
+                                  "  getcell VSDocTypes 2 1\n"
+                                  "  click cmdClose\n"
+                                  "click cmdRanges\n"
+                                  "  click cmdNoneItems\n"
+                                  "  getcell VSEditRange 1 3\n"
+                                  "  click cmdClose\n"
+                                  "click cmdSelectDocItems\n"
+                                  "  getcell VSDocHeaders 2 3\n"
+                                  "  setcell VSDocHeaders 2 1 x\n";
+        Run r = runCli(settings(), {"set", "txtDBPath", data, "--script", "-"}, script);
+        // A cell that is not typed in is refused as a mistake of the script.
+        QCOMPARE(r.exitCode, 2);
+        QCOMPARE(r.out, QStringList({QString::fromUtf8("הזמנות רכש"), "0", "04/02/26"}));
+        QCOMPARE(rows(data + "/" + dbfiles::Config, "SELECT DocType FROM tDocTypes WHERE Include = 1 ORDER BY 1"),
+                 QStringList({"1", "2", "3"}));
+        QCOMPARE(rows(data + "/" + dbfiles::Config, "SELECT DISTINCT LastIndx || '/' || FromIndx FROM tWizFileRanges"),
+                 QStringList{"49/0"});
+        // Typing into the second document's print box moves to it, so the lines are its own.
+        const QByteArray lines = "click cmdSelectDocItems\n"
+                                 "  setcell VSDocHeaders 2 5 0\n"
+                                 "  setcell VSDocLines 1 6 5\n"
+                                 "  click cmdNoneLines\n"
+                                 "  click cmdClose\n";
+        r = runCli(settings(), {"set", "txtDBPath", data, "--script", "-"}, lines);
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        QCOMPARE(rows(docs, "SELECT ItemKey || ':' || Copies || ':' || Include FROM tTempDocLines ORDER BY ItemKey"),
+                 QStringList({"A:1:1", "B:5:0", "C:1:0"}));
+        QCOMPARE(rows(docs, "SELECT Number || ':' || Include FROM tTempDocHeaders ORDER BY Number"), QStringList({"7:1", "8:0"}));
+    }
+
     void scriptFromStandardInput()
     {
         const QByteArray script = "# a selection script\n"

@@ -1,5 +1,6 @@
 #include "support/cardfixture.h"
 #include "support/oldlayout.h"
+#include "support/dbrows.h"
 
 #include "labels/itemquery.h"
 #include "localdb/schema.h"
@@ -7,6 +8,7 @@
 #include "platform/elidedlabel.h"
 #include "platform/namedcontrols.h"
 
+#include <QAbstractItemView>
 #include <QDir>
 #include <QLabel>
 #include <QLineEdit>
@@ -132,6 +134,44 @@ private slots:
         QApplication::sendEvent(f.c("cmdImportDocs"), &out);
         QCOMPARE(f.card->message(), QString());
         QCOMPARE(f.card->progress(), 0.0);
+    }
+
+    // The document road's dialogs open on the data folder typed on the screen.
+    void documentDialogs_data()
+    {
+        QTest::addColumn<QString>("button");
+        QTest::addColumn<QString>("form");
+        QTest::addColumn<QString>("grid");
+        QTest::addColumn<int>("rows");
+        QTest::newRow("document types") << "CmdDocType" << "frmDocType" << "VSDocTypes" << 6;
+        QTest::newRow("import ranges") << "cmdRanges" << "frmEditRanges" << "VSEditRange" << 6;
+        QTest::newRow("documents and lines") << "cmdSelectDocItems" << "frmSelectDocItem" << "VSDocLines" << 2;
+    }
+    void documentDialogs()
+    {
+        QFETCH(QString, button);
+        QFETCH(QString, form);
+        QFETCH(QString, grid);
+        QFETCH(int, rows);
+        CardFixture f;
+        const QString data = f.dir.filePath("data");
+        QVERIFY(!PrepareDataFolder(data));
+        DbError e;
+        QVERIFY(!CreateTempDocsDB(data + "/" + dbfiles::Config, data + "/" + dbfiles::Items,
+                                  data + "/" + dbfiles::TempDocs, &e).isEmpty());
+        QVERIFY(!execOn(data + "/" + dbfiles::TempDocs,
+                        "INSERT INTO tTempDocHeaders (WizFileID, Number, DocType, Include) VALUES (2, 7, 1, 1);"
+                        "INSERT INTO tTempDocLines (WizFileID, HeadNumber, LineNum, ItemKey, Include) VALUES"
+                        " (2, 7, 1, 'A', 1), (2, 7, 2, 'B', 1)"));
+        f.c<QLineEdit>("txtDBPath")->setText(data);
+        int shown = -1;
+        f.dialogs->drive = [&](QDialog& d) {
+            auto* view = d.findChild<QAbstractItemView*>(grid);
+            shown = view ? view->model()->rowCount() : -2;
+        };
+        f.c<QPushButton>(button)->click();
+        QCOMPARE(f.dialogs->opened, QStringList{form});
+        QCOMPARE(shown, rows);
     }
 
     // The picture beside a step clicks that step's button.
