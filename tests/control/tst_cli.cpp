@@ -228,6 +228,58 @@ private slots:
         QCOMPARE(r.out, QStringList({"Acme \"North\" Ltd", "7"}));
     }
 
+    // The road by documents, scripted: import the documents with their
+    // items, keep one document, set one line's copies, clear another line,
+    // print with header labels: a header label, then exactly the document's
+    // included lines with their copies.
+    void scriptedDocumentsPrint()
+    {
+        const QString journal = dir.filePath("docs-journal.txt");
+        const QString demo = dir.filePath("demo-docs");
+        writeSettings(QStringLiteral("[Automation]\nJournalFile=%1\n").arg(journal));
+        const QByteArray script = "set txtToDate 31/12/2030\n"
+                                  "set \"ChkFldSend(0)\" 1\n"
+                                  "set chkPrintHeadLabel 1\n"
+                                  "set chkReadDocItems 1\n"
+                                  "click cmdImportDocs\n"
+                                  "  click cmdNoneHeaders\n"
+                                  "  setcell VSDocHeaders 1 5 1\n"
+                                  "  setcell VSDocLines 2 6 3\n"
+                                  "  setcell VSDocLines 3 7 0\n"
+                                  "  click cmdClose\n"
+                                  "click cmdPrintDocButt\n";
+        const Run r = runCli(settings(), {"--demo", demo, "--script", "-"}, script);
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        QCOMPARE(r.out.last(), QString::fromUtf8("הכנת המדבקות הסתיימה"));
+
+        const QString docs = demo + "/data/" + dbfiles::TempDocs;
+        QCOMPARE(scalar(docs, "SELECT count(*) FROM tTempDocHeaders WHERE Include").toInt(), 1);
+        const QStringList lines = rows(docs, "SELECT l.ItemKey, l.Copies, l.LineNum, l.Include FROM tTempDocLines l"
+                                             " JOIN tTempDocHeaders h ON h.WizFileID = l.WizFileID AND h.Number = l.HeadNumber"
+                                             " WHERE h.Include ORDER BY l.LineNum");
+        QVERIFY(lines.size() >= 3);
+        QVERIFY2(lines[1].section('|', 1, 1) == "3", qPrintable(lines.join(' ')));
+        QCOMPARE(lines[2].section('|', 3, 3), QString("0"));
+        // Lines print when their item is in the items table (a service item is not).
+        QStringList expected = rows(docs, "SELECT l.ItemKey || ' ' || l.Copies FROM tTempDocLines l"
+                                          " JOIN tTempDocHeaders h ON h.WizFileID = l.WizFileID AND h.Number = l.HeadNumber"
+                                          " WHERE h.Include AND l.Include AND l.ItemKey IN (SELECT ItemKey FROM tItems)");
+        QStringList printed;
+        QString key;
+        for (const QString& line : QString::fromUtf8(readAll(journal)).split('\n')) {
+            if (line.contains("LabelSetVar("))
+                key = line.section('"', 3, 3);
+            else if (line.contains("LabelPrint("))
+                printed << key + " " + line.section('"', 1, 1).section(',', 0, 0);
+        }
+        QVERIFY(!printed.isEmpty());
+        // The header label comes first, one copy.
+        QVERIFY2(printed.takeFirst().endsWith(" 1"), qPrintable(printed.join(' ')));
+        printed.sort();
+        expected.sort();
+        QCOMPARE(printed, expected);
+    }
+
     // The whole road by items, scripted: import, select (find, mark, copies), print.
     void scriptedSelectionPrints()
     {
