@@ -4,10 +4,26 @@
 
 #include <QComboBox>
 #include <QHeaderView>
+#include <QPainter>
+#include <QPixmap>
 
 #include <algorithm>
 
 namespace tagora {
+
+QIcon ItemCardIcon()
+{
+    QPixmap pm(16, 16);
+    pm.fill(Qt::transparent);
+    QPainter p(&pm);
+    p.setPen(QColor(0x2b, 0x6c, 0xb0));
+    p.setBrush(QColor(0xe8, 0xf0, 0xfa));
+    p.drawRect(1, 2, 13, 11);
+    p.drawLine(4, 6, 11, 6);
+    p.drawLine(4, 9, 9, 9);
+    return QIcon(pm);
+}
+
 
 namespace {
 // A grid answers a click: when another program holds the file, a short wait

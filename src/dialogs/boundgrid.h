@@ -11,6 +11,9 @@
 
 namespace tagora {
 
+// The small card picture of a grid's item-card column: a card with two lines.
+QIcon ItemCardIcon();
+
 // One column of a bound grid: which field of the query it shows and how.
 struct BoundColumn {
     enum class Kind { Text, Number, Check, Picture, Choice, Button };

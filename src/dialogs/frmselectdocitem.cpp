@@ -20,19 +20,6 @@ constexpr int kHeadInclude = 5;
 constexpr int kHeadWizFileId = 7;
 constexpr int kHeadNumber = 8;
 
-// The small card picture of a line's first column.
-QIcon cardIcon()
-{
-    QPixmap pm(16, 16);
-    pm.fill(Qt::transparent);
-    QPainter p(&pm);
-    p.setPen(QColor(0x2b, 0x6c, 0xb0));
-    p.setBrush(QColor(0xe8, 0xf0, 0xfa));
-    p.drawRect(1, 2, 13, 11);
-    p.drawLine(4, 6, 11, 6);
-    p.drawLine(4, 9, 9, 9);
-    return QIcon(pm);
-}
 
 // A document key as SQL: the number itself, or NULL (which equals nothing)
 // for a text that is no whole number, so no grid text ever becomes SQL.
@@ -75,7 +62,7 @@ FrmSelectDocItem::FrmSelectDocItem(const QString& dataFolder, ControlCommands* c
         ui->VSDocHeaders->setColumnHidden(c, true);
 
     BoundColumn picture = boundColumn(QString(), QString(), K::Picture, false, Qt::AlignCenter);
-    picture.icon = cardIcon();
+    picture.icon = ItemCardIcon();
     // Copies are a 16-bit count; a negative one means nothing to a printer.
     BoundColumn copies = boundColumn(QStringLiteral("Copies"), QStringLiteral("עותקים"), K::Number, true);
     copies.minimum = 0;

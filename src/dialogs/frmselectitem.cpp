@@ -25,19 +25,6 @@ QString quoted(const QString& text)
     return t;
 }
 
-// The small card picture of the first column: a card with two lines.
-QIcon cardIcon()
-{
-    QPixmap pm(16, 16);
-    pm.fill(Qt::transparent);
-    QPainter p(&pm);
-    p.setPen(QColor(0x2b, 0x6c, 0xb0));
-    p.setBrush(QColor(0xe8, 0xf0, 0xfa));
-    p.drawRect(1, 2, 13, 11);
-    p.drawLine(4, 6, 11, 6);
-    p.drawLine(4, 9, 9, 9);
-    return QIcon(pm);
-}
 } // namespace
 
 FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCriteria, ControlCommands* commands,
@@ -57,7 +44,7 @@ FrmSelectItem::FrmSelectItem(const QString& dataFolder, const QString& itemCrite
 
     using K = BoundColumn::Kind;
     BoundColumn picture = boundColumn(QString(), QString(), K::Picture, false, Qt::AlignCenter);
-    picture.icon = cardIcon();
+    picture.icon = ItemCardIcon();
     // Copies are a 16-bit count; a negative one means nothing to a printer.
     BoundColumn copies = boundColumn(QStringLiteral("Copies"), QStringLiteral("עותקים"), K::Number, true);
     copies.minimum = 0;
