@@ -10,7 +10,6 @@
 #include "localdb/schema.h"
 #include "platform/progress.h"
 
-#include <QCryptographicHash>
 #include <QtTest>
 
 using namespace tagora;
@@ -517,30 +516,6 @@ private slots:
         QVERIFY(state.currentDocCriteria.sql.contains(QLatin1String("TYPE")));
     }
 
-    // The item readers by documents read the items of the documents read.
-    void itemsOfTheDocuments()
-    {
-        const QString folder = newFolder(QStringLiteral("1"));
-        DocCriteriaState state;
-        const DocImportResult r = import(folder, numbers(QStringLiteral("0001"), QStringLiteral("0003"), QStringLiteral("ZB-")),
-                                         2, nullptr, &state);
-        QVERIFY2(r.completed && r.errors.isEmpty(), qPrintable(r.errors.value(0).message));
-        QString error;
-        auto erp = openErp(BuildConnString(kDsn2, "sa", QVariant(), "demo", 2), &error);
-        QVERIFY2(erp, qPrintable(error));
-        auto rs = erp->query(itemQuerySql({}, {}, false, 0, false, state.currentItemByDocCriteria.sql,
-                                          state.currentItemByDocCriteria.params),
-                             &error);
-        QVERIFY2(rs, qPrintable(error));
-        QStringList names;
-        while (rs->next())
-            names << rs->value(QStringLiteral("PARTNAME")).toString().trimmed();
-        names.sort();
-        QStringList expected{partName(6), partName(7), partName(8)};
-        expected.sort();
-        QCOMPARE(names, expected);
-    }
-
     // With the related items asked for, each type's items are read by its
     // documents' criteria; a step that fails ends the run.
     void relatedItems_data()
@@ -592,24 +567,6 @@ private slots:
         QCOMPARE(scalar(docs(folder), QStringLiteral("SELECT count(*) FROM tTempDocHeaders")).toInt(), 0);
         QCOMPARE(rows(config(folder), QStringLiteral("SELECT count(*) FROM tWizFileRanges WHERE FromIndx > 0")),
                  QStringList{"0"});
-    }
-
-    // The import only reads the ERP.
-    void erpUntouched()
-    {
-        auto hash = [this] {
-            QFile f(erp2);
-            f.open(QIODevice::ReadOnly);
-            return QCryptographicHash::hash(f.readAll(), QCryptographicHash::Sha256);
-        };
-        const QByteArray before = hash();
-        const QString folder = newFolder(QStringLiteral("1, 2, 3, 4, 5, 6"));
-        DocImportOptions o;
-        o.qtyFrom = QtyPackages;
-        const DocImportResult r = import(folder, o);
-        QVERIFY2(r.completed && r.errors.isEmpty(), qPrintable(r.errors.value(0).message));
-        QVERIFY(scalar(docs(folder), QStringLiteral("SELECT count(*) FROM tTempDocLines")).toInt() > 0);
-        QCOMPARE(hash(), before);
     }
 };
 
