@@ -3,11 +3,13 @@
 // the same local tables as the same company read from SQLite. A second copy
 // of the company sits in a database whose server reads a backslash inside a
 // literal as an escape (standard_conforming_strings off), where doubling
-// apostrophes would not keep a value from ending its literal.
+// apostrophes would not keep a value from ending its literal. The document
+// import, read from both, must leave the same documents, lines and ranges.
 #include "support/dbrows.h"
 #include "support/erpfixture.h"
 
 #include "erp/connparams.h"
+#include "erp/docimport.h"
 #include "erp/itemimport.h"
 #include "localdb/database.h"
 #include "localdb/schema.h"
@@ -25,6 +27,7 @@ class TestPgImport : public QObject {
     QString port = qEnvironmentVariable("TAGORA_PG_PORT", "54329");
     QDate today = QDate::currentDate();
     QString lite;
+    int docRuns = 0;
 
     bool psql(const QStringList& args, QString* error)
     {
@@ -78,6 +81,34 @@ class TestPgImport : public QObject {
         for (const char* t : {"tAlterKeys", "tAlterPrices", "tPriceList"})
             out << QStringLiteral("== %1").arg(t) << rows(items, QStringLiteral("SELECT %1 FROM %2 ORDER BY 1, 2")
                                                                      .arg(QLatin1String(qstrcmp(t, "tPriceList") ? "AccountKey, ItemKey" : "ItemKey, PriceList"), QLatin1String(t)));
+        return out;
+    }
+
+    // The document import of every type, drafts included, into a new data
+    // folder whose recipes the given statement may change first: whether it
+    // completed, the titles of its errors (their texts go to messages), then
+    // the rows it left.
+    QStringList importDocs(const QString& dsn, const QString& tag, DocImportOptions o, const QString& recipeChange,
+                           QStringList* messages)
+    {
+        o.dataFolder = work.filePath("docs-" + tag);
+        const QString config = QDir(o.dataFolder).filePath(dbfiles::Config);
+        DbError e = PrepareDataFolder(o.dataFolder);
+        if (!e)
+            e = execOn(config, "UPDATE tDocTypes SET Include = TRUE, IncludeDraft = TRUE");
+        if (!e && !recipeChange.isEmpty())
+            e = execOn(config, recipeChange);
+        if (e)
+            return {e.message};
+        const DocImportResult r = ImportDocuments(ErpReadContext{pgConn(dsn), nullptr, QString(), today}, o, nullptr);
+        QStringList out{r.completed ? "completed" : "not completed"};
+        for (const ReadError& error : r.errors) {
+            out << error.title;
+            *messages << error.message;
+        }
+        out << "== tTempDocHeaders" << rows(r.tempDocsPath, "SELECT * FROM tTempDocHeaders ORDER BY WizFileID, Number")
+            << "== tTempDocLines" << rows(r.tempDocsPath, "SELECT * FROM tTempDocLines ORDER BY WizFileID, Number")
+            << "== tWizFileRanges" << rows(config, "SELECT * FROM tWizFileRanges ORDER BY WizFileID");
         return out;
     }
 
@@ -287,6 +318,72 @@ private slots:
         // The bounds that reach the server whole leave the families beyond them out.
         QCOMPARE(scalar(items, "SELECT count(*) FROM tItems WHERE ItemSort > '200'").toInt(), 0);
         QCOMPARE(expectedItems.isEmpty(), to.isEmpty());
+    }
+
+    // Every type read from the server as from the SQLite file: numbers and
+    // dates bound as values, the LIKE of one number, each quantity rule's
+    // extra query. A recipe naming a line column the ERP lacks is rejected by
+    // the server after its type's headers were read: that type ends with
+    // nothing kept and its range where it was, and the others are read.
+    void documentsAsFromSqlite_data()
+    {
+        QTest::addColumn<int>("rule");
+        QTest::addColumn<bool>("onlyLine0");
+        QTest::addColumn<QString>("fromDate");
+        QTest::addColumn<QString>("toDate");
+        QTest::addColumn<QString>("number");
+        QTest::addColumn<QString>("recipeChange");
+        const QString day = "d/M/yyyy";
+        QTest::newRow("line quantities, every date") << int(QtyLine) << false << "1/1/2000" << "31/12/2079" << "" << "";
+        QTest::newRow("two months, header details")
+            << int(QtyHeaderDetails) << false << today.addDays(-60).toString(day) << today.addDays(-1).toString(day)
+            << "" << "";
+        QTest::newRow("factory units, first line only") << int(QtyFactoryUnit) << true << "" << "" << "" << "";
+        QTest::newRow("packages") << int(QtyPackages) << false << "" << "" << "" << "";
+        QTest::newRow("one number, by its end") << int(QtyLine) << false << "" << "" << "000003" << "";
+        QTest::newRow("a line column the ERP lacks")
+            << int(QtyLine) << false << "" << "" << ""
+            << "UPDATE tWizFiles SET fldLineID = 'NO_SUCH_LINE' WHERE WizFileID = 2";
+    }
+    void documentsAsFromSqlite()
+    {
+        QFETCH(int, rule);
+        QFETCH(bool, onlyLine0);
+        QFETCH(QString, fromDate);
+        QFETCH(QString, toDate);
+        QFETCH(QString, number);
+        QFETCH(QString, recipeChange);
+        DocImportOptions o;
+        o.qtyFrom = rule;
+        o.qtyFactor = "2";
+        o.onlyLine0 = onlyLine0;
+        o.fromDate = fromDate;
+        o.toDate = toDate;
+        o.fromDocNum = o.toDocNum = number;
+        const QString tag = QString::number(++docRuns);
+        QStringList pgErrors, liteErrors;
+        const QStringList fromPg = importDocs("TagoraPg", "pg-" + tag, o, recipeChange, &pgErrors);
+        const QStringList fromLite = importDocs("TagoraLite", "lite-" + tag, o, recipeChange, &liteErrors);
+        QCOMPARE(fromPg, fromLite);
+        const QString docs = QDir(work.filePath("docs-pg-" + tag)).filePath(dbfiles::TempDocs);
+        const QString config = QDir(work.filePath("docs-pg-" + tag)).filePath(dbfiles::Config);
+        // Lines of every recipe were read.
+        QStringList recipes{"1", "2", "3", "4", "5"};
+        if (!recipeChange.isEmpty())
+            recipes.removeOne("2");
+        QCOMPARE(rows(docs, "SELECT DISTINCT WizFileID FROM tTempDocLines ORDER BY 1"), recipes);
+        if (recipeChange.isEmpty()) {
+            QCOMPARE(fromPg.first(), QString("completed"));
+            QVERIFY2(pgErrors.isEmpty(), qPrintable(pgErrors.join('\n')));
+            return;
+        }
+        // The servers word their refusals each in its own way; both name the column.
+        QCOMPARE(fromPg.mid(0, 2), (QStringList{"completed", QString::fromUtf8("תקלה בקריאת מסמכים")}));
+        QCOMPARE(pgErrors.size(), 1);
+        QVERIFY2(pgErrors[0].contains("no_such_line", Qt::CaseInsensitive), qPrintable(pgErrors[0]));
+        QVERIFY2(liteErrors.value(0).contains("no_such_line", Qt::CaseInsensitive), qPrintable(liteErrors.value(0)));
+        QCOMPARE(scalar(docs, "SELECT count(*) FROM tTempDocHeaders WHERE WizFileID = 2").toInt(), 0);
+        QCOMPARE(rows(config, "SELECT LastIndx, FromIndx FROM tWizFileRanges WHERE WizFileID = 1"), QStringList{"0|0"});
     }
 
     void priceFieldsFromServer()
