@@ -502,6 +502,9 @@ private:
     bool readLines(qint64 id, ReadError* error)
     {
         QString message;
+        // Each document's lines are an operation of their own, with the whole
+        // time-out: a type with many documents must not starve its last ones.
+        m_erpLines.restartTimeout();
         auto rs = m_erpLines.query(docLineSql(m_r, m_rule, id), &message);
         if (!rs) {
             fail(error, message);

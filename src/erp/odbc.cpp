@@ -423,6 +423,7 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
     close();
     m_timeout = timeoutSeconds;
     m_deadline = timeoutSeconds > 0 ? QDeadlineTimer(qint64(timeoutSeconds) * 1000) : QDeadlineTimer(QDeadlineTimer::Forever);
+    m_busyWaitSet = -1;
     auto fail = [&](SQLSMALLINT type, SQLHANDLE handle) {
         if (error)
             *error = diagnostics(type, handle);
@@ -499,6 +500,14 @@ bool ErpConnection::open(const QString& connectionText, int timeoutSeconds, QStr
             return refuse(message);
     }
     return true;
+}
+
+void ErpConnection::restartTimeout()
+{
+    if (m_timeout <= 0)
+        return;
+    m_deadline = QDeadlineTimer(qint64(m_timeout) * 1000);
+    m_busyWaitSet = -1;
 }
 
 int ErpConnection::remainingSeconds() const
@@ -875,10 +884,13 @@ std::unique_ptr<ErpRecordset> ErpConnection::query(const QString& sql, const Erp
     }
     // The operation's time-out is one budget: each statement waits only for
     // what the ones before it left, a locked SQLite file included.
-    if (isSqlite() && m_timeout > 0) {
+    if (isSqlite() && m_timeout > 0
+        && (m_busyWaitSet < 0 || !m_busyWaitSince.isValid() || m_busyWaitSince.elapsed() > 1000)) {
         const qint64 ms = std::max<qint64>(1, m_deadline.remainingTime());
         if (!execute(QStringLiteral("PRAGMA busy_timeout = %1").arg(ms), error))
             return nullptr;
+        m_busyWaitSet = ms;
+        m_busyWaitSince.start();
     }
     auto* stmt = static_cast<SQLHSTMT>(newStatement(error));
     if (!stmt)

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <QDeadlineTimer>
+#include <QElapsedTimer>
 #include <QString>
 #include <QStringList>
 #include <QVariant>
@@ -43,6 +44,10 @@ public:
     // value it cannot take safely is refused, and a missing file is reported
     // rather than created.
     bool open(const QString& connectionText, int timeoutSeconds, QString* error);
+    // Starts the time-out's budget again, for a connection that serves many
+    // small operations one after another (the lines of each document): each
+    // gets the whole time-out, and a long run of them does not starve the last.
+    void restartTimeout();
     void close();
     bool isOpen() const;
 
@@ -92,6 +97,10 @@ private:
     QString m_dbms;
     int m_timeout = 0;
     QDeadlineTimer m_deadline;
+    // The SQLite lock wait last set, and when: it is set again only when it
+    // could run a second past the budget, not before every statement.
+    qint64 m_busyWaitSet = -1;
+    QElapsedTimer m_busyWaitSince;
 };
 
 class ErpRecordset {
