@@ -705,13 +705,12 @@ DocImportResult ImportDocuments(const ErpReadContext& ctx, const DocImportOption
         const qint64 read = ReadStockPriority(ctx, result.tempDocsPath, type, fromDate, toDate, type.includeDraft,
                                               o, state, &error);
         if (read == 0) {
+            // The run ends with the type that failed (nothing of it is kept);
+            // the types read before it stay for the user to see.
             if (error.message.isEmpty())
                 error.message = QStringLiteral("קריאת המסמכים נכשלה");
             result.errors.push_back(error);
-            // A cancel ends the run; a failing type leaves the others to be read.
-            if (ctx.progress && ctx.progress->cancelRequested())
-                return result;
-            continue;
+            return result;
         }
         if (o.readDocItems && itemsStep) {
             message(QStringLiteral("קורא נתוני פריטים קשורים"));

@@ -116,7 +116,8 @@ struct DocImportResult {
 
 // The whole run: a new temporary documents database, every included type,
 // the related items (through itemsStep, when options ask for them), the
-// alternate numbers. A type that fails is reported and the next one read.
+// alternate numbers. A type that fails is reported, keeps nothing, and ends
+// the run; a type without documents does not.
 DocImportResult ImportDocuments(const ErpReadContext& ctx, const DocImportOptions& options, DocCriteriaState* state,
                                 const DocItemsStep& itemsStep = {});
 

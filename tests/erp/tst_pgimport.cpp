@@ -323,8 +323,8 @@ private slots:
     // Every type read from the server as from the SQLite file: numbers and
     // dates bound as values, the LIKE of one number, each quantity rule's
     // extra query. A recipe naming a line column the ERP lacks is rejected by
-    // the server after its type's headers were read: that type ends with
-    // nothing kept and its range where it was, and the others are read.
+    // the server after its type's headers were read: the run ends there,
+    // nothing of that type kept and its range where it was.
     void documentsAsFromSqlite_data()
     {
         QTest::addColumn<int>("rule");
@@ -367,18 +367,16 @@ private slots:
         QCOMPARE(fromPg, fromLite);
         const QString docs = QDir(work.filePath("docs-pg-" + tag)).filePath(dbfiles::TempDocs);
         const QString config = QDir(work.filePath("docs-pg-" + tag)).filePath(dbfiles::Config);
-        // Lines of every recipe were read.
-        QStringList recipes{"1", "2", "3", "4", "5"};
-        if (!recipeChange.isEmpty())
-            recipes.removeOne("2");
-        QCOMPARE(rows(docs, "SELECT DISTINCT WizFileID FROM tTempDocLines ORDER BY 1"), recipes);
         if (recipeChange.isEmpty()) {
+            // Lines of every recipe were read.
+            QCOMPARE(rows(docs, "SELECT DISTINCT WizFileID FROM tTempDocLines ORDER BY 1"),
+                     (QStringList{"1", "2", "3", "4", "5"}));
             QCOMPARE(fromPg.first(), QString("completed"));
             QVERIFY2(pgErrors.isEmpty(), qPrintable(pgErrors.join('\n')));
             return;
         }
         // The servers word their refusals each in its own way; both name the column.
-        QCOMPARE(fromPg.mid(0, 2), (QStringList{"completed", QString::fromUtf8("תקלה בקריאת מסמכים")}));
+        QCOMPARE(fromPg.mid(0, 2), (QStringList{"not completed", QString::fromUtf8("תקלה בקריאת מסמכים")}));
         QCOMPARE(pgErrors.size(), 1);
         QVERIFY2(pgErrors[0].contains("no_such_line", Qt::CaseInsensitive), qPrintable(pgErrors[0]));
         QVERIFY2(liteErrors.value(0).contains("no_such_line", Qt::CaseInsensitive), qPrintable(liteErrors.value(0)));
