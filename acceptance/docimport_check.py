@@ -443,7 +443,7 @@ RUNS = [
     ("rule 3, factor 2, first line only", 0, dict(rule=3, factor="2", only_line1=True)),
     ("rule 4, factor 3, numbers with a prefix", "mid", dict(rule=4, factor="3", only_line1=False,
                                                           pref="N0", **{"from": "100", "to": "250"})),
-    ("rule 0, factor 0.5, lower number only with a prefix", "mid",
+    ("rule 0, factor 0.5, lower number only with a prefix, from far ahead", "high",
      dict(rule=0, factor="0.5", only_line1=True, pref="N0", **{"from": "200"})),
     ("rule 1, text factor, same number in both boxes", 0,
      dict(rule=1, factor="x", only_line1=False, pref="", **{"from": "5", "to": "5"})),
@@ -520,6 +520,8 @@ def main():
                 cfg.execute("UPDATE tWizFileRanges SET FromIndx = 0, LastIndx = 0")
             elif start == "mid":
                 cfg.execute("UPDATE tWizFileRanges SET FromIndx = 20, LastIndx = 19")
+            elif start == "high":  # beyond every document: a run by numbers must not move it back
+                cfg.execute("UPDATE tWizFileRanges SET FromIndx = 9000, LastIndx = 8999")
             cfg.commit()
             cfg.close()
             ranges = read_ranges(data)
