@@ -556,9 +556,11 @@ def main():
     print("\nSummary")
     for label, n in summary:
         print(f"  {'ok  ' if n == 0 else 'DIFF'} {label}" + (f" ({n})" if n else ""))
-    print(f"  {total} differences; work folder {work}")
     if not args.keep and total == 0:
         shutil.rmtree(work, ignore_errors=True)
+        print(f"  {total} differences")
+    else:
+        print(f"  {total} differences; the files are in {work}")
     return 0 if total == 0 else 1
 
 
