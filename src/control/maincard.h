@@ -24,6 +24,7 @@ namespace tagora {
 class CommonDialog;
 struct ReadError;
 struct ErpReadContext;
+struct DocImportOptions;
 struct CaselessKeysReport;
 
 // What the control hands to a dialog before it opens it.
@@ -198,6 +199,9 @@ private:
     bool reportRead(bool ok, const ReadError& error);
     // A reader's context that carries the current documents' item criteria.
     ErpReadContext docReadContext(const QString& conn);
+    ErpReadContext plainContext(const QString& conn);
+    // The document import's settings as the tab holds them.
+    DocImportOptions docImportOptions() const;
     int priceListNumber() const;
 
     std::unique_ptr<Ui::MainCardForm> ui;

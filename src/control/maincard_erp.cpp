@@ -5,6 +5,8 @@
 #include "dialogs/frmlogon.h"
 #include "erp/connparams.h"
 #include "erp/docimport.h"
+#include "erp/textconv.h"
+#include "localdb/conversions.h"
 #include "erp/itemimport.h"
 #include "erp/odbc.h"
 #include "localdb/schema.h"
@@ -224,9 +226,18 @@ bool MainCard::cancelRequested()
     return m_work && m_work->cancelRequested();
 }
 
+ErpReadContext MainCard::plainContext(const QString& conn)
+{
+    ErpReadContext ctx;
+    ctx.connString = conn;
+    ctx.progress = this;
+    return ctx;
+}
+
 ErpReadContext MainCard::docReadContext(const QString& conn)
 {
-    ErpReadContext ctx{conn, this, m_currentItemByDocCriteria.sql};
+    ErpReadContext ctx = plainContext(conn);
+    ctx.itemByDocCriteria = m_currentItemByDocCriteria.sql;
     ctx.itemByDocParams = m_currentItemByDocCriteria.params;
     return ctx;
 }
@@ -238,7 +249,64 @@ void MainCard::UpdateDocsAlterKeys(const QString& pDBName)
         m_services.prompt->critical(titles::Fault, error);
 }
 
-void MainCard::ImportDocuments()
+namespace {
+// A qDocTypes row as a host hands it over, its columns found without regard to case.
+DocTypeRecipe recipeOf(const QVariantMap& row)
+{
+    return DocTypeRecipeFrom([&row](const QString& column) {
+        for (auto it = row.cbegin(); it != row.cend(); ++it)
+            if (it.key().compare(column, Qt::CaseInsensitive) == 0)
+                return it.value();
+        return QVariant();
+    });
+}
+
+QVariant dateOrNull(const QVariant& value)
+{
+    if (value.typeId() == QMetaType::QDate || value.typeId() == QMetaType::QDateTime)
+        return QVariant(value.toDate());
+    const QString text = value.toString().trimmed();
+    if (text.isEmpty())
+        return QVariant();
+    const auto d = ParseDayMonthYear(text);
+    return d ? QVariant(*d) : QVariant();
+}
+} // namespace
+
+QString MainCard::BuildDocRangeCriteria(const QVariantMap& rsDT, const QVariant& FromDate, const QVariant& ToDate,
+                                        const QString& FromDocNum, const QString& ToDocNum, int Indx,
+                                        bool pIncludeDraft)
+{
+    const short type = erpConnType();
+    const ErpQuery criteria = tagora::BuildDocRangeCriteria(recipeOf(rsDT), dateOrNull(FromDate), dateOrNull(ToDate),
+                                                            FromDocNum, ToDocNum, Indx, pIncludeDraft,
+                                                            erpDialect().likeWildcard, type);
+    m_currentDocCriteria = CriteriaText(criteria, type);
+    return m_currentDocCriteria;
+}
+
+int MainCard::ReadStockPriority(const QString& CompPath, const QString& pDBName, short DocTypeID,
+                                const QVariantMap& rsDT, const QVariant& FromDate, const QVariant& ToDate,
+                                bool pDraftDocs, bool pWithExport)
+{
+    DocImportOptions o = docImportOptions();
+    o.withExport = pWithExport;
+    DocTypeRecipe recipe = recipeOf(rsDT);
+    recipe.docType = DocTypeID;
+    DocCriteriaState state;
+    ReadError error;
+    const qint64 read = tagora::ReadStockPriority(plainContext(CompPath), pDBName, recipe, dateOrNull(FromDate),
+                                                  dateOrNull(ToDate), pDraftDocs, o, &state, &error);
+    m_currentDocCriteria = state.currentDocCriteria.sql;
+    m_currentItemByDocCriteria = state.currentItemByDocCriteria;
+    if (read == 0) {
+        m_services.prompt->critical(error.title, error.message);
+        return 0;
+    }
+    return int(std::clamp<qint64>(read, std::numeric_limits<int>::min(), std::numeric_limits<int>::max()));
+}
+
+DocImportOptions MainCard::docImportOptions() const
 {
     DocImportOptions o;
     o.dataFolder = ui->txtDBPath->text();
@@ -253,6 +321,12 @@ void MainCard::ImportDocuments()
     o.readDocItems = ui->chkReadDocItems->isChecked();
     if (auto* send = control<QCheckBox>(QStringLiteral("ChkFldSend(17)")))
         o.withExport = send->isChecked();
+    return o;
+}
+
+void MainCard::ImportDocuments()
+{
+    const DocImportOptions o = docImportOptions();
 
     if (const DbError e = PrepareDataFolder(o.dataFolder)) {
         m_services.prompt->critical(titles::Fault, e.message);
@@ -282,7 +356,7 @@ void MainCard::ImportDocuments()
     DocImportResult result;
     {
         CancellableWork work(this);
-        result = tagora::ImportDocuments(ErpReadContext{conn, this}, o, &state, items);
+        result = tagora::ImportDocuments(plainContext(conn), o, &state, items);
     }
     m_currentDocCriteria = state.currentDocCriteria.sql;
     m_currentItemByDocCriteria = state.currentItemByDocCriteria;

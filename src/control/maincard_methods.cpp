@@ -5,12 +5,6 @@
 
 namespace tagora {
 
-QString MainCard::BuildDocRangeCriteria(const QVariantMap&, const QVariant&, const QVariant&, const QString&,
-                                        const QString&, int, bool)
-{
-    return QString();
-}
-
 void MainCard::FillCmbUser() {}
 
 short MainCard::ReadLabelDefPriority(const QString&, const QString&)
@@ -31,12 +25,6 @@ short MainCard::ReadLabelDataPriority(const QString&, const QString&)
 QVariant MainCard::BuildItemQueryFromPlate(uchar, uchar)
 {
     return QVariant(QString());
-}
-
-int MainCard::ReadStockPriority(const QString&, const QString&, short, const QVariantMap&, const QVariant&,
-                                const QVariant&, bool, bool)
-{
-    return 0;
 }
 
 void MainCard::CreateListFile(const QString&, const QString&, uchar, uchar) {}

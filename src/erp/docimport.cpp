@@ -97,6 +97,38 @@ QString LikeWildcardFor(const ErpConnection& erp)
     return erpDialect().likeWildcard;
 }
 
+DocTypeRecipe DocTypeRecipeFrom(const std::function<QVariant(const QString&)>& value)
+{
+    auto text = [&value](const char* column) { return value(QLatin1String(column)).toString(); };
+    auto truth = [&value](const char* column) {
+        const QVariant v = value(QLatin1String(column));
+        return v.typeId() == QMetaType::Bool ? v.toBool() : v.toLongLong() != 0;
+    };
+    DocTypeRecipe r;
+    r.docType = value(QStringLiteral("DocType")).toInt();
+    r.docDesc = text("DocDesc");
+    r.wizFileId = value(QStringLiteral("WizFileID")).toInt();
+    r.vType = value(QStringLiteral("vTYPE"));
+    r.include = truth("Include");
+    r.includeDraft = truth("IncludeDraft");
+    r.csTableId = value(QStringLiteral("CSTableID")).toInt();
+    r.headTable = text("HeadTable");
+    r.lineTable = text("LineTable");
+    r.fldID = text("fldID");
+    r.fldRef1 = text("fldRef1");
+    r.fldRef2 = text("fldRef2");
+    r.fldDate = text("fldDate");
+    r.fldLineID = text("fldLineID");
+    r.fldDocCSID = text("fldDocCSID");
+    r.noDraft = text("NoDraft");
+    r.csTableName = text("CSTableName");
+    r.fldCSID = text("fldCSID");
+    r.fldCSKey = text("fldCSKey");
+    r.fldCSDesc = text("fldCSDesc");
+    r.fldMerakezID = text("fldMerakezID");
+    return r;
+}
+
 QVector<DocTypeRecipe> ReadDocTypes(const Database& tempDocs, DbError* error)
 {
     QVector<DocTypeRecipe> types;
@@ -107,32 +139,9 @@ QVector<DocTypeRecipe> ReadDocTypes(const Database& tempDocs, DbError* error)
             *error = e;
         return types;
     }
-    auto text = [&s](const char* column) { return s.value(QLatin1String(column)).toString(); };
-    auto truth = [&s](const char* column) { return s.value(QLatin1String(column)).toLongLong() != 0; };
     Statement::Step step;
     while ((step = s.step()) == Statement::Step::Row) {
-        DocTypeRecipe r;
-        r.docType = s.value(QStringLiteral("DocType")).toInt();
-        r.docDesc = text("DocDesc");
-        r.wizFileId = s.value(QStringLiteral("WizFileID")).toInt();
-        r.vType = s.value(QStringLiteral("vTYPE"));
-        r.include = truth("Include");
-        r.includeDraft = truth("IncludeDraft");
-        r.csTableId = s.value(QStringLiteral("CSTableID")).toInt();
-        r.headTable = text("HeadTable");
-        r.lineTable = text("LineTable");
-        r.fldID = text("fldID");
-        r.fldRef1 = text("fldRef1");
-        r.fldRef2 = text("fldRef2");
-        r.fldDate = text("fldDate");
-        r.fldLineID = text("fldLineID");
-        r.fldDocCSID = text("fldDocCSID");
-        r.noDraft = text("NoDraft");
-        r.csTableName = text("CSTableName");
-        r.fldCSID = text("fldCSID");
-        r.fldCSKey = text("fldCSKey");
-        r.fldCSDesc = text("fldCSDesc");
-        r.fldMerakezID = text("fldMerakezID");
+        DocTypeRecipe r = DocTypeRecipeFrom([&s](const QString& column) { return s.value(column); });
         types.push_back(r);
     }
     if (step == Statement::Step::Error && error)
@@ -180,6 +189,35 @@ ErpQuery BuildDocRangeCriteria(const DocTypeRecipe& rsDT, const QVariant& fromDa
         }
     }
     return q;
+}
+
+QString CriteriaText(const ErpQuery& criteria, short connType)
+{
+    QString out;
+    qsizetype next = 0;
+    bool quoted = false;
+    for (const QChar c : criteria.sql) {
+        if (c == QLatin1Char('\''))
+            quoted = !quoted;
+        if (c != QLatin1Char('?') || quoted || next >= criteria.params.size()) {
+            out += c;
+            continue;
+        }
+        const QVariant& v = criteria.params[next++];
+        const int type = v.typeId();
+        if (v.isNull()) {
+            out += QStringLiteral("NULL");
+        } else if (type == QMetaType::QDate || type == QMetaType::QDateTime) {
+            out += DateToErpLiteral(v, connType);
+        } else if (type == QMetaType::QString) {
+            QString t = v.toString();
+            t.replace(QLatin1Char('\''), QStringLiteral("''"));
+            out += QLatin1Char('\'') + t + QLatin1Char('\'');
+        } else {
+            out += v.toString();
+        }
+    }
+    return out;
 }
 
 ErpQuery BuildItemByDocCriteria(const QString& headTable, const QString& lineTable, const QString& fldID,

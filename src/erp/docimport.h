@@ -57,6 +57,8 @@ struct DocTypeRecipe {
 // The document types to import, in the stored query's order: those included
 // with or without their drafts.
 QVector<DocTypeRecipe> ReadDocTypes(const Database& tempDocs, DbError* error);
+// A recipe from the columns of a qDocTypes row, found by name.
+DocTypeRecipe DocTypeRecipeFrom(const std::function<QVariant(const QString&)>& value);
 
 // The selection of the documents last read and of the items on them; the item
 // readers append the second when they read by documents.
@@ -80,6 +82,12 @@ ErpQuery BuildDocRangeCriteria(const DocTypeRecipe& rsDT, const QVariant& fromDa
                                const QString& fromDocNum, const QString& toDocNum, qint64 indx, bool includeDraft,
                                const QString& likeWildcard, short connType);
 // The restriction of an item query to the items on the documents criteria selects.
+// Criteria as plain SQL text, their values written in as the ERP's literals
+// (texts between apostrophes, each doubled; dates by the connection type),
+// for a host that asks for the text. The import itself sends the values
+// bound, never in this form.
+QString CriteriaText(const ErpQuery& criteria, short connType);
+
 ErpQuery BuildItemByDocCriteria(const QString& headTable, const QString& lineTable, const QString& fldID,
                                 const ErpQuery& docCriteria);
 

@@ -494,6 +494,37 @@ private slots:
 
     // A type without documents says so and the run goes on; a recipe the
     // ERP rejects keeps nothing of its type and ends the run.
+    // The criteria as text for a host: values in the ERP's literal forms,
+    // apostrophes doubled, "?" inside a literal left alone.
+    void criteriaAsText_data()
+    {
+        QTest::addColumn<int>("connType");
+        QTest::addColumn<QString>("from");
+        QTest::addColumn<QString>("to");
+        QTest::addColumn<QString>("text");
+        QTest::newRow("type 1, numbers and days")
+            << 1 << "A'1" << "B?"
+            << " AND H.TYPE = 'O' And H.DT >= #01/02/2026# And H.DT < #04/02/2026# And H.REF >= 'A''1' And  H.REF <= 'B?'";
+        QTest::newRow("type 2, one number by its end")
+            << 2 << "7" << "7" << " AND H.TYPE = 'O' And H.DT >= 20031840 And H.DT < 20036160 And H.REF LIKE '*7'";
+    }
+    void criteriaAsText()
+    {
+        QFETCH(int, connType);
+        QFETCH(QString, from);
+        QFETCH(QString, to);
+        QFETCH(QString, text);
+        DocTypeRecipe r;
+        r.headTable = "H";
+        r.fldID = "ID";
+        r.fldDate = "DT";
+        r.fldRef1 = "REF";
+        r.vType = "O";
+        const ErpQuery q = BuildDocRangeCriteria(r, QDate(2026, 2, 1), QDate(2026, 2, 3), from, to, 5, true, "*",
+                                                 short(connType));
+        QCOMPARE(CriteriaText(q, short(connType)), text);
+    }
+
     void faultyAndEmptyTypes_data()
     {
         QTest::addColumn<QString>("types");
