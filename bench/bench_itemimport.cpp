@@ -17,6 +17,7 @@
 #include "erp/itemimport.h"
 #include "localdb/database.h"
 #include "localdb/schema.h"
+#include "benchchild.h"
 
 #include <QCoreApplication>
 #include <QElapsedTimer>
@@ -35,34 +36,16 @@
 #include <sys/wait.h>
 #include <vector>
 
-extern char** environ;
 
 using namespace tagora;
+using namespace benchchild;
 
 namespace {
 
 constexpr int kRuns = 5;
 const char* const kDsn = "BenchErp";
 
-QString erpPath(const QString& dir)
-{
-    return dir + QStringLiteral("/erp.sqlite");
-}
-
 // ------------------------------------------------------------- the children
-
-// --make-demo DIR ITEMS: the demo company at DIR/erp.sqlite.
-int makeDemo(const QString& dir, int items)
-{
-    DemoOptions options;
-    options.items = items;
-    options.connType = 2;
-    if (const DbError e = CreateDemoErp(erpPath(dir), options)) {
-        std::fprintf(stderr, "demo company: %s\n", qPrintable(e.message));
-        return 1;
-    }
-    return 0;
-}
 
 // --import DIR: the import of the company at DIR into fresh local databases
 // in a new folder under DIR, removed after. Prints one line for the parent:
@@ -118,75 +101,6 @@ int importOnce(const QString& dir)
 
 // --------------------------------------------------------------- the parent
 
-struct Child {
-    bool ok = false;
-    double seconds = 0; // wall time from start to end
-    long maxRssKiB = 0; // the child's own peak, from wait4
-};
-
-// Runs program with args, stdin from inFile and stdout to outFile when given,
-// and waits for it.
-Child runChild(const QString& program, const QStringList& args, const QString& inFile = {},
-               const QString& outFile = {})
-{
-    std::vector<std::string> strings{QFile::encodeName(program).toStdString()};
-    for (const QString& a : args)
-        strings.push_back(QFile::encodeName(a).toStdString());
-    std::vector<char*> argv;
-    for (std::string& s : strings)
-        argv.push_back(s.data());
-    argv.push_back(nullptr);
-    const std::string in = QFile::encodeName(inFile).toStdString(), out = QFile::encodeName(outFile).toStdString();
-    posix_spawn_file_actions_t actions;
-    posix_spawn_file_actions_init(&actions);
-    if (!in.empty())
-        posix_spawn_file_actions_addopen(&actions, 0, in.c_str(), O_RDONLY, 0);
-    if (!out.empty())
-        posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0644);
-    Child c;
-    QElapsedTimer t;
-    t.start();
-    pid_t pid = 0;
-    const int rc = posix_spawn(&pid, argv[0], &actions, nullptr, argv.data(), environ);
-    posix_spawn_file_actions_destroy(&actions);
-    if (rc != 0) {
-        std::fprintf(stderr, "cannot start %s: %s\n", argv[0], std::strerror(rc));
-        return c;
-    }
-    int status = 0;
-    rusage usage{};
-    while (wait4(pid, &status, 0, &usage) < 0 && errno == EINTR) {
-    }
-    c.seconds = t.nsecsElapsed() / 1e9;
-    c.maxRssKiB = usage.ru_maxrss;
-    c.ok = WIFEXITED(status) && WEXITSTATUS(status) == 0;
-    return c;
-}
-
-struct Spread {
-    double median = 0, min = 0, max = 0;
-};
-
-Spread spread(std::vector<double> v)
-{
-    std::sort(v.begin(), v.end());
-    return {v[v.size() / 2], v.front(), v.back()};
-}
-
-QString mib(double kib)
-{
-    return QString::number(kib / 1024.0, 'f', 1);
-}
-
-// The value of key=... on the line.
-QString field(const QString& line, const QString& key)
-{
-    for (const QString& part : line.split(QLatin1Char(' '), Qt::SkipEmptyParts))
-        if (part.startsWith(key + QLatin1Char('=')))
-            return part.mid(key.size() + 1);
-    return QString();
-}
-
 long long count(const QString& db, const QString& sql)
 {
     Database d;
@@ -203,16 +117,8 @@ int bench(int items)
         return 1;
     }
     const QString dir = tmp.path();
-    // A private ODBC set-up: the system's drivers and one data source on the demo file.
-    QFile::copy(QStringLiteral("/etc/odbcinst.ini"), dir + QStringLiteral("/odbcinst.ini"));
-    {
-        QFile ini(dir + QStringLiteral("/odbc.ini"));
-        if (!ini.open(QIODevice::WriteOnly)
-            || ini.write(QStringLiteral("[%1]\nDriver=SQLite3\nDatabase=%2\n").arg(QLatin1String(kDsn), erpPath(dir)).toUtf8()) < 0) {
-            std::fprintf(stderr, "cannot write %s\n", qPrintable(ini.fileName()));
-            return 1;
-        }
-    }
+    if (!writeOdbcSetup(dir, QLatin1String(kDsn), erpPath(dir)))
+        return 1;
 
     // The demo company, before any timing.
     const Child demo = runChild(self, {QStringLiteral("--make-demo"), dir, QString::number(items)});
