@@ -13,6 +13,7 @@
 #include "platform/filedialog.h"
 #include "platform/namedcontrols.h"
 #include "platform/pageviewer.h"
+#include "platform/printdialog.h"
 #include "platform/prompt.h"
 #include "platform/settingsstore.h"
 
@@ -190,6 +191,7 @@ private:
         m_store = services.settings;
         services.prompt = m_prompt;
         services.fileDialog = m_files;
+        services.printDialog = std::make_shared<ScriptedPrintDialog>(m_files.get());
         services.pages = std::make_shared<PrintedPages>();
         // The card lives as long as this interpreter, which outlives every use of it.
         services.dialogs = std::shared_ptr<DialogRunner>(this, [](DialogRunner*) {});

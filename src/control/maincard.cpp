@@ -1,13 +1,17 @@
 #include "control/maincard.h"
 
 #include "control/settingstable.h"
+#include "dialogs/frmaccdef.h"
+#include "dialogs/frmalteritems.h"
 #include "dialogs/frmdoctype.h"
 #include "dialogs/frmeditranges.h"
+#include "dialogs/frmedititems.h"
 #include "dialogs/frmselectdocitem.h"
 #include "dialogs/frmselectitem.h"
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
 #include "labels/labelprograms.h"
+#include "erp/connparams.h"
 #include "localdb/schema.h"
 #include "platform/clicklabel.h"
 #include "platform/controlbinding.h"
@@ -16,6 +20,7 @@
 #include "platform/pageviewer.h"
 #include "platform/platformdefaults.h"
 #include "platform/printercatalog.h"
+#include "platform/printdialog.h"
 #include "platform/prompt.h"
 #include "platform/settingsstore.h"
 
@@ -713,6 +718,16 @@ void MainCard::showDialog(const QString& formName)
         dialog = std::make_unique<FrmEditRanges>(m_shared.dataFolder, m_services.prompt, this);
     else if (formName == QLatin1String("frmSelectDocItem"))
         dialog = std::make_unique<FrmSelectDocItem>(m_shared.dataFolder, this, m_services.prompt, this);
+    else if (formName == QLatin1String("frmAccDef"))
+        dialog = std::make_unique<FrmAccDef>(m_shared.dataFolder, m_shared.labelProgram,
+                                             FillCmbPriceFieldInGrid(currentConnString()), m_services.prompt,
+                                             m_services.fileDialog, this);
+    else if (formName == QLatin1String("frmAlterItems"))
+        dialog = std::make_unique<FrmAlterItems>(
+            m_shared.dataFolder, m_services.prompt,
+            m_services.printDialog ? m_services.printDialog : std::make_shared<WidgetPrintDialog>(this), this);
+    else if (formName == QLatin1String("frmEditItems"))
+        dialog = std::make_unique<FrmEditItems>(m_shared.dataFolder, m_shared.itemTextRtl, m_services.prompt, this);
     if (dialog)
         runDialog(*dialog);
 }

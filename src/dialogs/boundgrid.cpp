@@ -52,8 +52,21 @@ void BoundTableModel::setSource(const QString& dbPath, const QString& baseTable,
 
 bool BoundTableModel::setQuery(const QString& sql)
 {
+    return setQuery(sql, {});
+}
+
+bool BoundTableModel::setQuery(const QString& sql, const QVariantList& params)
+{
+    // A query that fails keeps the rows, and the query, shown before.
+    const QString oldSql = m_sql;
+    const QVariantList oldParams = m_params;
     m_sql = sql;
-    return refresh();
+    m_params = params;
+    if (refresh())
+        return true;
+    m_sql = oldSql;
+    m_params = oldParams;
+    return false;
 }
 
 bool BoundTableModel::refresh()
@@ -64,6 +77,8 @@ bool BoundTableModel::refresh()
     Statement s;
     if (!e)
         s = db.prepare(m_sql, &e);
+    for (int i = 0; !e && i < m_params.size(); ++i)
+        s.bind(i + 1, m_params[i]);
     if (e) {
         m_error = e.message;
         return false;
@@ -286,6 +301,69 @@ void BoundTableModel::clearRows()
     beginResetModel();
     m_rows.clear();
     endResetModel();
+}
+
+bool BoundTableModel::addRecord(const QVector<QPair<QString, QVariant>>& values)
+{
+    m_duplicate = false;
+    QStringList names, marks;
+    for (const auto& [field, value] : values) {
+        names << QStringLiteral("\"%1\"").arg(field);
+        marks << QStringLiteral("?");
+    }
+    Database db;
+    db.setBusyWait(kGridBusyWaitMs);
+    DbError e = db.open(m_dbPath);
+    Statement insert;
+    if (!e)
+        insert = db.prepare(QStringLiteral("INSERT INTO \"%1\" (%2) VALUES (%3)")
+                                .arg(m_base, names.join(QStringLiteral(", ")), marks.join(QStringLiteral(", "))),
+                            &e);
+    for (int i = 0; !e && i < values.size(); ++i)
+        insert.bind(i + 1, values[i].second);
+    if (!e)
+        e = insert.run();
+    if (e) {
+        m_error = e.message;
+        m_duplicate = e.isDuplicateKey();
+        return false;
+    }
+    db.close();
+    refresh();
+    return true;
+}
+
+bool BoundTableModel::deleteRecord(int row)
+{
+    if (row < 0 || row >= m_rows.size() || m_keys.isEmpty()) {
+        m_error = QStringLiteral("לא נבחרה שורה למחיקה");
+        return false;
+    }
+    QStringList where;
+    for (int k = 0; k < m_keys.size(); ++k)
+        where << QStringLiteral("\"%1\" = ?").arg(m_keys[k]);
+    Database db;
+    db.setBusyWait(kGridBusyWaitMs);
+    DbError e = db.open(m_dbPath);
+    Statement del;
+    if (!e)
+        del = db.prepare(QStringLiteral("DELETE FROM \"%1\" WHERE %2").arg(m_base, where.join(QStringLiteral(" AND "))), &e);
+    for (int k = 0; !e && k < m_keys.size(); ++k)
+        del.bind(k + 1, value(row, m_keys[k]));
+    if (!e)
+        e = del.run();
+    // Someone else may have deleted or re-keyed it since it was shown.
+    if (!e && db.changes() == 0)
+        e = DbError::notFound(QStringLiteral("השורה כבר אינה בטבלה"));
+    db.close();
+    if (e) {
+        m_error = e.message;
+        refresh();
+        m_error = e.message;
+        return false;
+    }
+    refresh();
+    return true;
 }
 
 QVariant BoundTableModel::headerData(int section, Qt::Orientation orientation, int role) const

@@ -59,6 +59,9 @@ public:
     // Runs the query and shows its rows; false (with lastError) when it failed,
     // leaving the rows shown before.
     bool setQuery(const QString& sql);
+    // The same with values for the query's "?" markers, in order: what the
+    // user typed reaches the engine as a value, never as query text.
+    bool setQuery(const QString& sql, const QVariantList& params);
     bool refresh();
     QString query() const { return m_sql; }
     QString lastError() const { return m_error; }
@@ -75,6 +78,14 @@ public:
     // something no longer there, which must not go on showing (or taking
     // marks for) what it showed before.
     void clearRows();
+    // Adds one row to the base table (field, value pairs) and shows the rows
+    // again; false (with lastError, and isDuplicateKey when the key is taken)
+    // when nothing was added. Reported by the caller, not through writeFailed.
+    bool addRecord(const QVector<QPair<QString, QVariant>>& values);
+    bool lastWasDuplicateKey() const { return m_duplicate; }
+    // Deletes the row's record from the base table and shows the rows again;
+    // false (with lastError) when no record was deleted.
+    bool deleteRecord(int row);
 
     int rowCount(const QModelIndex& parent = QModelIndex()) const override;
     int columnCount(const QModelIndex& parent = QModelIndex()) const override;
@@ -97,6 +108,8 @@ private:
     QStringList m_keys;
     QVector<BoundColumn> m_columns;
     QString m_sql;
+    QVariantList m_params;
+    bool m_duplicate = false;
     QStringList m_fields;              // the query's columns
     QVector<QVector<QVariant>> m_rows; // values by query column
     QString m_error;

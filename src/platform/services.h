@@ -11,6 +11,7 @@ class SettingsStore;
 class Prompt;
 class FileDialogProvider;
 class PrinterCatalog;
+class PrintDialogProvider;
 class DialogRunner;
 // Defined by the labels layer; held here only by pointer, so the services can
 // carry a host's label program providers without this layer knowing them.
@@ -45,6 +46,8 @@ struct Services {
     std::shared_ptr<Prompt> prompt;
     std::shared_ptr<FileDialogProvider> fileDialog;
     std::shared_ptr<PrinterCatalog> printers;
+    // The printer dialog shown before a grid is printed.
+    std::shared_ptr<PrintDialogProvider> printDialog;
     std::shared_ptr<DialogRunner> dialogs;
     // Providers of label programs' automation objects; the journal named in
     // the settings serves every program without one.
