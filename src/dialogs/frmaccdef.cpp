@@ -45,9 +45,16 @@ public:
 
     void paint(QPainter* painter, const QStyleOptionViewItem& option, const QModelIndex& index) const override
     {
-        BoundItemDelegate::paint(painter, option, index);
+        // The text keeps clear of the button.
+        QStyleOptionViewItem text = option;
+        const QRect button = buttonRect(option);
+        if (button.left() <= option.rect.left() + 1)
+            text.rect.setLeft(button.right() + 2);
+        else
+            text.rect.setRight(button.left() - 2);
+        BoundItemDelegate::paint(painter, text, index);
         QStyleOptionButton b;
-        b.rect = buttonRect(option);
+        b.rect = button;
         b.text = QStringLiteral("...");
         b.state = QStyle::State_Enabled | QStyle::State_Raised;
         QStyle* style = option.widget ? option.widget->style() : QApplication::style();
@@ -154,10 +161,10 @@ FrmAccDef::FrmAccDef(const QString& dataFolder, int labelProgram, const ChoiceLi
     // The key selected too: every edit and delete finds its row by it.
     m_model->setQuery(QStringLiteral("Select DefID, AccountKey,PriceList,LabelName, FldID, FldMaxLen, Label2Name From tAccountDef"
                                      " Order By DefID"));
-    // Widths from the form's twips (15 to a pixel), kept over every refresh:
+    // Widths after the form's, kept over every refresh:
     // file names are long and the cells have their buttons to show.
     auto widths = [this] {
-        const int w[] = {0, 100, 133, 333, 133, 50, 333};
+        const int w[] = {0, 90, 120, 260, 120, 50, 260};
         for (int c = 1; c < 7; ++c)
             ui->VSAccountDef->setColumnWidth(c, w[c]);
     };
