@@ -10,6 +10,7 @@
 #include <QFile>
 #include <QProcess>
 #include <QSettings>
+#include <QStringDecoder>
 #include <QTemporaryDir>
 #include <QtTest>
 
@@ -362,6 +363,53 @@ private slots:
         QCOMPARE(r.exitCode, 1);
         QCOMPARE(r.out.first(), QString("3"));
         QVERIFY2(r.err.last().endsWith(QString::fromUtf8("לא נבחרו פריטים להדפסה")), qPrintable(r.err.join('\n')));
+    }
+
+    // A label list on the direct page: each layout line shows the parameter
+    // its field's row names; a barcode line whose row names none has no
+    // column to draw from, and the run says so instead of showing a page.
+    void labelListDirectPage_data()
+    {
+        QTest::addColumn<bool>("barcodeNumbered");
+        QTest::newRow("barcode from a parameter") << true;
+        QTest::newRow("barcode without a parameter") << false;
+    }
+    void labelListDirectPage()
+    {
+        QFETCH(bool, barcodeNumbered);
+        const QString demo = dir.filePath(barcodeNumbered ? "plate-direct1" : "plate-direct2");
+        QByteArray script = "set \"OptOLE(3)\" True\n"
+                            "click \"lblVarNum(1)\"\n"
+                            "click \"lblVarNum(1)\"\n";
+        // The demo layout: the name (row 1) on top, then the barcode (row 4).
+        if (barcodeNumbered)
+            script += "click \"lblVarNum(4)\"\nclick \"lblVarNum(4)\"\nclick \"lblVarNum(4)\"\n";
+        script += "click cmdLabByPlate\n";
+        const Run r = runCli(settings(), {"--demo", demo, "--script", "-"}, script);
+        if (!barcodeNumbered) {
+            QCOMPARE(r.exitCode, 1);
+            QVERIFY2(r.err.last().contains("BarCode"), qPrintable(r.err.join('\n')));
+            return;
+        }
+        QVERIFY2(r.exitCode == 0, qPrintable((r.out + r.err).join('\n')));
+        const QStringList pages = r.out.filter(QRegularExpression("^page: "));
+        QCOMPARE(pages.size(), 1);
+        const QByteArray page = readAll(pages.first().mid(6));
+        QStringDecoder decode("windows-1255");
+        const QString text = decode(page);
+        const QStringList lines = rows(demo + "/erp/demo.sqlite",
+                                       "SELECT PAR2 || '|' || LABELQUANT || '|' || coalesce(PAR3, '') FROM LABELS"
+                                       " WHERE USER = 1 AND LABELQUANT > 0");
+        QVERIFY(!lines.isEmpty());
+        int labels = 0;
+        for (const QString& line : lines) {
+            QVERIFY2(text.contains(line.section('|', 0, 0).toHtmlEscaped().replace('\'', "&#39;")),
+                     qPrintable(line));
+            // A line without a barcode value gets an empty cell, not a picture.
+            if (!line.section('|', 2).isEmpty())
+                labels += line.section('|', 1, 1).toInt();
+        }
+        QCOMPARE(int(page.count("<img src=")), labels);
     }
 
     // The whole road by items, scripted: import, select (find, mark, copies), print.
