@@ -9,6 +9,7 @@
 #include <QVariantMap>
 #include <QWidget>
 #include <memory>
+#include <vector>
 
 class QLabel;
 class QFrame;
@@ -26,6 +27,7 @@ struct ReadError;
 struct ErpReadContext;
 struct DocImportOptions;
 struct CaselessKeysReport;
+struct PlateFieldRow;
 
 // What the control hands to a dialog before it opens it.
 struct SharedDialogState {
@@ -186,10 +188,14 @@ private:
     // Work that other parts of the system do for the commands above.
     bool SetDefaultPrinter(const QString& printer, QString* error);
     void SetBrowserPrinter(const QString& printer);
-    void PrintDirectLabels(uchar queryType, const QString& dbPath);
+    // byPlate: the records of the ERP's label list, a field filled by the
+    // parameter its row names (empty when it names none).
+    bool PrintDirectLabels(uchar queryType, const QString& dbPath, bool byPlate = false);
     bool prepareDirectFields(QString* error);
     // Why the label-data query of the screen's settings cannot run, or empty text.
     QString labelQueryProblem() const;
+    // The label field table as the label-list query reads it.
+    std::vector<PlateFieldRow> plateFieldRows() const;
     void ShowItemList(uchar queryType, const QString& dbPath);
     void ImportItems();
     void ImportDocuments();

@@ -105,18 +105,22 @@ bool MainCard::CreateLabFile(const QString& pFileName, const QString& pDBName, u
     return false;
 }
 
-void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
+bool MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath, bool byPlate)
 {
-    auto fail = [this](const QString& error) { m_services.prompt->critical(titles::Fault, error); };
+    auto fail = [this](const QString& error) {
+        m_services.prompt->critical(titles::Fault, error);
+        return false;
+    };
     QString error;
-    if (!prepareDirectFields(&error) || !(error = labelQueryProblem()).isEmpty())
+    // A label list's record carries no expressions to check.
+    if (!prepareDirectFields(&error) || (!byPlate && !(error = labelQueryProblem()).isEmpty()))
         return fail(error);
     const DirectLabelLayout& layout = directLabelLayout();
     // Before the job folder is emptied: a layout no sheet can hold leaves the last job's page as it was.
     if (!(error = CheckDirectLayout(layout)).isEmpty())
         return fail(error);
     const uchar order = control<QRadioButton>(QStringLiteral("OptPrinter(1)"))->isChecked() ? 2 : 1;
-    const QString sql = BuildItemQuery(queryType, order).toString();
+    const QString sql = (byPlate ? BuildItemQueryFromPlate(queryType, order) : BuildItemQuery(queryType, order)).toString();
     const QString folder = directJobFolder();
     if (!(error = PrepareJobFolder(folder)).isEmpty())
         return fail(error);
@@ -146,6 +150,7 @@ void MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath)
     const QString lacking = BarcodeRefusalMessage(refused, labels);
     if (!lacking.isEmpty())
         m_services.prompt->message(PromptIcon::Exclamation, titles::Attention, lacking);
+    return true;
 }
 
 } // namespace tagora

@@ -1,14 +1,16 @@
 // The control's side of the ERP: the connection, the price lists offered,
-// and the item import with its public readers.
+// the item import with its public readers, and the ERP's label lists.
 #include "control/maincard.h"
 
 #include "dialogs/frmlogon.h"
 #include "erp/connparams.h"
 #include "erp/docimport.h"
 #include "erp/textconv.h"
+#include "labels/labelfields.h"
 #include "localdb/conversions.h"
 #include "erp/itemimport.h"
 #include "erp/odbc.h"
+#include "erp/platelists.h"
 #include "localdb/schema.h"
 #include "platform/prompt.h"
 #include "platform/settingsstore.h"
@@ -20,6 +22,7 @@
 #include <QElapsedTimer>
 #include <QFileInfo>
 #include <QKeyEvent>
+#include <QLabel>
 
 #include <cmath>
 
@@ -509,6 +512,97 @@ void MainCard::ImportItems()
     }
     setProgress(1.0);
     setMessage(QStringLiteral("הייבוא הסתיים בהצלחה"));
+}
+
+// ------------------------------------------------------------ label lists
+
+void MainCard::FillCmbUser()
+{
+    QString error;
+    const QVector<ErpUser> users = ReadErpUsers(currentConnString(), &error);
+    // No users read (no ERP, or none there): the list keeps what it offered.
+    if (users.isEmpty())
+        return;
+    QComboBox* list = ui->cmbUser;
+    list->clear();
+    for (const ErpUser& u : users)
+        list->addItem(u.login, u.user);
+}
+
+int MainCard::GetUserNum()
+{
+    const int i = ui->cmbUser->currentIndex();
+    return i == -1 ? 1 : ui->cmbUser->itemData(i).toInt();
+}
+
+short MainCard::ReadLabelDefPriority(const QString& CompPath, const QString& pDBPath)
+{
+    ReadError e;
+    return fromBool(reportRead(tagora::ReadLabelDefPriority(plainContext(CompPath), pDBPath, ui->txtLabelName->text(), &e), e));
+}
+
+short MainCard::ReadLabelDataPriority(const QString& CompPath, const QString& pDBPath)
+{
+    ReadError e;
+    return fromBool(reportRead(tagora::ReadLabelDataPriority(plainContext(CompPath), pDBPath, GetUserNum(), &e), e));
+}
+
+std::vector<PlateFieldRow> MainCard::plateFieldRows() const
+{
+    std::vector<PlateFieldRow> rows;
+    for (int row = 0; row < LabelFieldCount; ++row) {
+        const auto* send = control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row));
+        const auto* var = control<QLabel>(QStringLiteral("lblVarNum(%1)").arg(row));
+        const auto* desc = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(row));
+        rows.push_back({send && send->checkState() == Qt::Checked, var ? var->text() : QString(),
+                        desc ? desc->property("Tag").toString() : QString()});
+    }
+    return rows;
+}
+
+QVariant MainCard::BuildItemQueryFromPlate(uchar, uchar pOrderBy)
+{
+    const QString key = ui->txtAccKeyForPlate->text();
+    const bool useKey = ui->ChkUseAccKeyForPlate->checkState() == Qt::Checked && !key.isEmpty();
+    return QVariant(PlateItemQuery(useKey ? key : QString(), plateFieldRows(), pOrderBy));
+}
+
+void MainCard::PrintFromLabelList()
+{
+    auto fail = [this](const QString& message) { m_services.prompt->critical(titles::Fault, message); };
+    if (const DbError e = PrepareDataFolder(ui->txtDBPath->text()))
+        return fail(e.message);
+    DbError e;
+    const QString db = CreateTempDocsDB(dataFile(dbfiles::Config), dataFile(dbfiles::Items), dataFile(dbfiles::TempDocs), &e);
+    if (db.isEmpty())
+        return fail(e.message);
+    const QString conn = currentConnString();
+    // A list read in part would print labels the ERP never asked for, or miss
+    // some without a word: a failed read ends the run.
+    setMessage(QStringLiteral("קורא רשימת מדבקות"));
+    if (!ReadLabelDefPriority(conn, db))
+        return ClearMessage();
+    setMessage(QStringLiteral("קורא נתונים מהמשטח"));
+    if (!ReadLabelDataPriority(conn, db))
+        return ClearMessage();
+    const short program = GetOLEOption();
+    setMessage(QStringLiteral("שולח מדבקות להדפסה"));
+    // The direct engine (code 6) draws the labels itself, on the printer
+    // chosen as the print buttons set it; no label program is driven.
+    if (program == 6 && ui->cmbPrinter->currentIndex() >= 0) {
+        QString error;
+        if (!SetDefaultPrinter(ui->cmbPrinter->currentText(), &error)) {
+            fail(error);
+            return ClearMessage();
+        }
+        SetBrowserPrinter(ui->cmbPrinter->currentText());
+    }
+    const bool printed = program == 6 ? PrintDirectLabels(2, db, true)
+                                                   : RunOLE(ui->txtLabelName->text(), 1, 2, program, db, false, true) != 0;
+    if (!printed)
+        return ClearMessage();
+    setProgress(1.0);
+    setMessage(QStringLiteral("סריקת המשטח והדפסת המדבקות הסתיימה"));
 }
 
 } // namespace tagora

@@ -3,6 +3,7 @@
 #include "control/maincard.h"
 
 #include "control/settingstable.h"
+#include "erp/platelists.h"
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
 #include "labels/labelrun.h"
@@ -78,10 +79,12 @@ short MainCard::RunOLE(const QString& DefaultLabelName, short /*Copies*/, uchar 
     r.sql = (ByPlate ? BuildItemQueryFromPlate(pQueryType, order) : BuildItemQuery(pQueryType, order)).toString();
     LabelQuerySettings rows;
     readFieldRows(*this, rows);
+    const std::vector<PlateFieldRow> plateRows = ByPlate ? plateFieldRows() : std::vector<PlateFieldRow>();
     for (int row = 0; row < LabelFieldCount; ++row) {
-        // The label list's record fills an expression row from its parameter,
-        // not from an expression.
-        if (ByPlate ? !rows.sent[size_t(row)] : !RowIsSent(rows, row))
+        // The label list's record has a column for the rows that name a
+        // parameter, an expression row included, and for no other.
+        if (ByPlate ? !(plateRows[size_t(row)].sent && PlateVarNumber(plateRows[size_t(row)].varCaption) > 0)
+                    : !RowIsSent(rows, row))
             continue;
         const auto* name = control<QLabel>(QStringLiteral("LblFldName(%1)").arg(row));
         const auto* desc = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(row));

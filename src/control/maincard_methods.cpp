@@ -5,35 +5,11 @@
 
 namespace tagora {
 
-void MainCard::FillCmbUser() {}
-
-short MainCard::ReadLabelDefPriority(const QString&, const QString&)
-{
-    return 0;
-}
-
-int MainCard::GetUserNum()
-{
-    return 0;
-}
-
-short MainCard::ReadLabelDataPriority(const QString&, const QString&)
-{
-    return 0;
-}
-
-QVariant MainCard::BuildItemQueryFromPlate(uchar, uchar)
-{
-    return QVariant(QString());
-}
-
 void MainCard::CreateListFile(const QString&, const QString&, uchar, uchar) {}
 
 // ---- hooks
 
 void MainCard::ShowItemList(uchar, const QString&) {}
-
-void MainCard::PrintFromLabelList() {}
 
 void MainCard::showItemCard(const QString&, bool) {}
 

@@ -185,7 +185,7 @@ std::vector<Table> schema(bool labelLists)
         table("LABELSDEF", {I("LABELDEF"), V("LABELNAME", 32), V("LABELPATH", 80)}, {"LABELDEF"});
         std::vector<Column> labels{I("USER"), I("KLINE"), I("LABELQUANT"), I("LABELDEF"), I("Sort")};
         for (int n = 1; n <= 20; ++n)
-            labels.push_back({QStringLiteral("PAR%1").arg(n), Kind::Text, 48});
+            labels.push_back({QStringLiteral("PAR%1").arg(n), Kind::Text, 80});
         table("LABELS", std::move(labels), {"USER", "KLINE"});
     }
     return t;
@@ -1270,6 +1270,11 @@ private:
                 labels.add(row);
             }
         }
+        // A text too long for the label field in its cell form (2n + 1).
+        std::vector<QVariant> longText{6, ++kline, 1, 1, 5, u8("LONG-1"),
+                                       u8("מדבקה עם תאור ארוך במיוחד שאינו נכנס בשדה של מאה תווים")};
+        longText.resize(5 + 20);
+        labels.add(longText);
     }
 
     const DemoOptions m_options;

@@ -10,6 +10,7 @@
 #include <QFile>
 #include <QProcess>
 #include <QSettings>
+#include <QStringDecoder>
 #include <QTemporaryDir>
 #include <QtTest>
 
@@ -92,9 +93,10 @@ private slots:
         QTest::newRow("file dialog") << QStringList{"--file", "/labels/a b.lbl", "click", "CmdDir(1)", "get",
                                                     "txtLabelName"}
                                      << QStringList{"/labels/a b.lbl"};
+        // No ERP, so no user chosen: the list of user 1 is the one read.
         QTest::newRow("method with result") << QStringList{"call", "GetUserNum", "call", "ClearMessage", "get",
                                                            "Message1"}
-                                            << QStringList{"0", ""};
+                                            << QStringList{"1", ""};
         QTest::newRow("status line") << QStringList{"set", "txtDBPath", "/nonexistent", "click", "cmdUpgrade"}
                                      << QStringList{QString::fromUtf8("השדרוג נכשל")};
     }
@@ -278,6 +280,136 @@ private slots:
         printed.sort();
         expected.sort();
         QCOMPARE(printed, expected);
+    }
+
+    // The ERP's label list, scripted: every line of the user's list prints,
+    // in the list's order (a roll printer takes it last to first), with the
+    // file of its definition (the default one where that file is not here),
+    // its parameters in the label variables their numbers name, and its quantity.
+    void scriptedLabelListPrints()
+    {
+        const QString journal = dir.filePath("plate-journal.txt");
+        const QString demo = dir.filePath("demo-plate");
+        writeSettings(QStringLiteral("[Automation]\nJournalFile=%1\n").arg(journal));
+        // The stored position picks the first user, number 1.
+        Run r = runCli(settings(), {"--demo", demo, "call", "GetUserNum", "get", "cmbUser.Text"});
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        QCOMPARE(r.out.mid(r.out.size() - 2), QStringList({"1", "admin"}));
+        const QString erp = demo + "/erp/demo.sqlite";
+        const QString own = demo + "/shelf.lbl";
+        QFile f(own);
+        QVERIFY(f.open(QIODevice::WriteOnly) && f.write("x") == 1);
+        f.close();
+        QVERIFY(!execOn(erp, QStringLiteral("UPDATE LABELSDEF SET LABELPATH = '%1' WHERE LABELDEF = 1").arg(own)));
+
+        const QByteArray script = "set \"ChkFldSend(0)\" 1\n"
+                                  "click \"lblVarNum(0)\"\n"
+                                  "set \"ChkFldSend(1)\" 1\n"
+                                  "click \"lblVarNum(1)\"\n"
+                                  "click \"lblVarNum(1)\"\n"
+                                  "set \"ChkFldSend(2)\" 1\n"
+                                  "set txtLabelName /labels/default.lbl\n"
+                                  "click cmdLabByPlate\n";
+        r = runCli(settings(), {"--script", "-"}, script);
+        QVERIFY2(r.exitCode == 0, qPrintable((r.out + r.err).join('\n')));
+        QCOMPARE(r.out.last(), QString::fromUtf8("סריקת המשטח והדפסת המדבקות הסתיימה"));
+
+        // The parameters as the label shows them: a text in cell form, cell
+        // by cell; any other as it stands.
+        auto shown = [](const QString& cells) {
+            if (!cells.contains(QChar(0x05F0)))
+                return cells;
+            QString out;
+            static const QString pairs = "()<>[]{}";
+            for (QChar c : cells) {
+                if (c == QChar(0x05F0))
+                    continue;
+                const int i = pairs.indexOf(c);
+                out += i < 0 ? c : pairs[i ^ 1];
+            }
+            return out;
+        };
+        QStringList expected;
+        for (const QString& line : rows(erp, "SELECT LABELDEF, PAR1, PAR2, LABELQUANT FROM LABELS WHERE USER = 1"
+                                             " ORDER BY Sort DESC, KLINE DESC")) {
+            const QStringList v = line.split('|');
+            expected << QStringList{v[0] == "1" ? own : "/labels/default.lbl", v[1], v[2], v[3]}.join(" ; ");
+        }
+        QStringList printed;
+        QString file;
+        QStringList values;
+        for (const QString& line : QString::fromUtf8(readAll(journal)).split('\n')) {
+            if (line.contains("LabelOpen(")) {
+                file = line.section('"', 1, 1);
+            } else if (line.contains("LabelSetVar(")) {
+                const int start = line.indexOf('"', line.indexOf('"', line.indexOf('"', line.indexOf('"') + 1) + 1)) + 1;
+                const QString quoted = line.mid(start, line.lastIndexOf("\", -9999") - start);
+                // The journal writes a quote or a backslash after a backslash.
+                QString value;
+                for (qsizetype i = 0; i < quoted.size(); ++i)
+                    value += quoted[i] == '\\' && i + 1 < quoted.size() ? quoted[++i] : quoted[i];
+                values << shown(value);
+            } else if (line.contains("LabelPrint(")) {
+                printed << (QStringList{file} + values + QStringList{line.section('"', 1, 1).section(',', 0, 0)}).join(" ; ");
+                values.clear();
+            }
+        }
+        QCOMPARE(printed.size(), 8);
+        QVERIFY(!expected.filter(own).isEmpty());
+        QCOMPARE(printed, expected);
+
+        // A user with an empty list: the run reads nothing and says so.
+        r = runCli(settings(), {"set", "cmbUser", "2", "call", "GetUserNum", "click", "cmdLabByPlate"});
+        QCOMPARE(r.exitCode, 1);
+        QCOMPARE(r.out.first(), QString("3"));
+        QVERIFY2(r.err.last().endsWith(QString::fromUtf8("לא נבחרו פריטים להדפסה")), qPrintable(r.err.join('\n')));
+    }
+
+    // A label list on the direct page: each layout line shows the parameter
+    // its field's row names; a barcode line whose row names none has no
+    // column to draw from, and the run says so instead of showing a page.
+    void labelListDirectPage_data()
+    {
+        QTest::addColumn<bool>("barcodeNumbered");
+        QTest::newRow("barcode from a parameter") << true;
+        QTest::newRow("barcode without a parameter") << false;
+    }
+    void labelListDirectPage()
+    {
+        QFETCH(bool, barcodeNumbered);
+        const QString demo = dir.filePath(barcodeNumbered ? "plate-direct1" : "plate-direct2");
+        QByteArray script = "set \"OptOLE(3)\" True\n"
+                            "click \"lblVarNum(1)\"\n"
+                            "click \"lblVarNum(1)\"\n";
+        // The demo layout: the name (row 1) on top, then the barcode (row 4).
+        if (barcodeNumbered)
+            script += "click \"lblVarNum(4)\"\nclick \"lblVarNum(4)\"\nclick \"lblVarNum(4)\"\n";
+        script += "click cmdLabByPlate\n";
+        const Run r = runCli(settings(), {"--demo", demo, "--script", "-"}, script);
+        if (!barcodeNumbered) {
+            QCOMPARE(r.exitCode, 1);
+            QVERIFY2(r.err.last().contains("BarCode"), qPrintable(r.err.join('\n')));
+            return;
+        }
+        QVERIFY2(r.exitCode == 0, qPrintable((r.out + r.err).join('\n')));
+        const QStringList pages = r.out.filter(QRegularExpression("^page: "));
+        QCOMPARE(pages.size(), 1);
+        const QByteArray page = readAll(pages.first().mid(6));
+        QStringDecoder decode("windows-1255");
+        const QString text = decode(page);
+        const QStringList lines = rows(demo + "/erp/demo.sqlite",
+                                       "SELECT PAR2 || '|' || LABELQUANT || '|' || coalesce(PAR3, '') FROM LABELS"
+                                       " WHERE USER = 1 AND LABELQUANT > 0");
+        QVERIFY(!lines.isEmpty());
+        int labels = 0;
+        for (const QString& line : lines) {
+            QVERIFY2(text.contains(line.section('|', 0, 0).toHtmlEscaped().replace('\'', "&#39;")),
+                     qPrintable(line));
+            // A line without a barcode value gets an empty cell, not a picture.
+            if (!line.section('|', 2).isEmpty())
+                labels += line.section('|', 1, 1).toInt();
+        }
+        QCOMPARE(int(page.count("<img src=")), labels);
     }
 
     // The whole road by items, scripted: import, select (find, mark, copies), print.
