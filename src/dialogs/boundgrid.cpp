@@ -1,6 +1,7 @@
 #include "dialogs/boundgrid.h"
 
 #include "localdb/database.h"
+#include "platform/prompt.h"
 
 #include <QComboBox>
 #include <QHeaderView>
@@ -476,6 +477,20 @@ void ChoiceDelegate::setModelData(QWidget* editor, QAbstractItemModel* model, co
     auto* box = static_cast<QComboBox*>(editor);
     if (box->currentIndex() >= 0)
         model->setData(index, box->currentData(), Qt::EditRole);
+}
+
+void DeleteCurrentRecord(BoundGrid& grid, BoundTableModel& model, Prompt& prompt, const QString& question,
+                         const QString& failure)
+{
+    const int row = grid.currentRowIndex();
+    if (row < 0)
+        return;
+    if (!prompt.ask(PromptIcon::Question, titles::Attention, question))
+        return;
+    if (!model.deleteRecord(row))
+        prompt.critical(titles::Error, failure + model.lastError());
+    else
+        grid.setCurrentRowIndex(std::min(row, model.rowCount() - 1));
 }
 
 } // namespace tagora

@@ -164,6 +164,14 @@ public:
     void setModelData(QWidget* editor, QAbstractItemModel* model, const QModelIndex& index) const override;
 };
 
+class Prompt;
+
+// Deletes the grid's current record after asking the question (No keeps it);
+// a delete that fails is reported with the failure text and the engine's
+// reason, so it never looks done. The current row stays where it was.
+void DeleteCurrentRecord(BoundGrid& grid, BoundTableModel& model, Prompt& prompt, const QString& question,
+                         const QString& failure);
+
 } // namespace tagora
 
 using tagora::BoundGrid;

@@ -199,15 +199,7 @@ void FrmAccDef::cmdAddAccount_Click()
 
 void FrmAccDef::DelAccountDef_Click()
 {
-    const int row = ui->VSAccountDef->currentRowIndex();
-    if (row < 0)
-        return;
-    if (!m_prompt->ask(PromptIcon::Question, titles::Attention, QStringLiteral("למחוק את ההגדרה?")))
-        return;
-    if (!m_model->deleteRecord(row))
-        m_prompt->critical(titles::Error, QStringLiteral("ההגדרה לא נמחקה: ") + m_model->lastError());
-    else
-        ui->VSAccountDef->setCurrentRowIndex(std::min(row, m_model->rowCount() - 1));
+    DeleteCurrentRecord(*ui->VSAccountDef, *m_model, *m_prompt, QStringLiteral("למחוק את ההגדרה?"), QStringLiteral("ההגדרה לא נמחקה: "));
 }
 
 } // namespace tagora

@@ -113,15 +113,7 @@ void FrmAlterItems::cmdSetAltBar_Click()
 
 void FrmAlterItems::cmdDelAlterKey_Click()
 {
-    const int row = ui->VSAlterKeys->currentRowIndex();
-    if (row < 0)
-        return;
-    if (!m_prompt->ask(PromptIcon::Question, titles::Attention, QStringLiteral("למחוק את השורה?")))
-        return;
-    if (!m_model->deleteRecord(row))
-        m_prompt->critical(titles::Error, QStringLiteral("השורה לא נמחקה: ") + m_model->lastError());
-    else
-        ui->VSAlterKeys->setCurrentRowIndex(std::min(row, m_model->rowCount() - 1));
+    DeleteCurrentRecord(*ui->VSAlterKeys, *m_model, *m_prompt, QStringLiteral("למחוק את השורה?"), QStringLiteral("השורה לא נמחקה: "));
 }
 
 void FrmAlterItems::cmdPrintAltKeys_Click()

@@ -121,15 +121,7 @@ void FrmEditItems::cmdAddAccount_Click()
 
 void FrmEditItems::DelAccountDef_Click()
 {
-    const int row = ui->VSEditItems->currentRowIndex();
-    if (row < 0)
-        return;
-    if (!m_prompt->ask(PromptIcon::Question, titles::Attention, QStringLiteral("למחוק את הפריט?")))
-        return;
-    if (!m_model->deleteRecord(row))
-        m_prompt->critical(titles::Error, QStringLiteral("הפריט לא נמחק: ") + m_model->lastError());
-    else
-        ui->VSEditItems->setCurrentRowIndex(std::min(row, m_model->rowCount() - 1));
+    DeleteCurrentRecord(*ui->VSEditItems, *m_model, *m_prompt, QStringLiteral("למחוק את הפריט?"), QStringLiteral("הפריט לא נמחק: "));
 }
 
 } // namespace tagora
