@@ -6,6 +6,7 @@
 #include "dialogs/frmdoctype.h"
 #include "dialogs/frmeditranges.h"
 #include "dialogs/frmedititems.h"
+#include "dialogs/frmlabdef.h"
 #include "dialogs/frmselectdocitem.h"
 #include "dialogs/frmselectitem.h"
 #include "labels/itemquery.h"
@@ -705,6 +706,15 @@ void MainCard::cmdLabDesign_Click()
     m_shared.dataFolder = ui->txtDBPath->text();
     m_shared.objectRef = this;
     showDialog(QStringLiteral("frmLabDef"));
+    m_shared.objectRef = nullptr;
+}
+
+QStringList MainCard::fieldCaptions() const
+{
+    QStringList captions;
+    while (const auto* desc = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(captions.size())))
+        captions << desc->text();
+    return captions;
 }
 
 // The dialogs that take only the shared state, by their form names. A name
@@ -728,6 +738,8 @@ void MainCard::showDialog(const QString& formName)
             m_services.printDialog ? m_services.printDialog : std::make_shared<WidgetPrintDialog>(this), this);
     else if (formName == QLatin1String("frmEditItems"))
         dialog = std::make_unique<FrmEditItems>(m_shared.dataFolder, m_shared.itemTextRtl, m_services.prompt, this);
+    else if (formName == QLatin1String("frmLabDef"))
+        dialog = std::make_unique<FrmLabDef>(directLabelLayout(), fieldCaptions(), m_services.prompt, this);
     if (dialog)
         runDialog(*dialog);
 }

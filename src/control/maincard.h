@@ -150,6 +150,8 @@ private:
     void FillPrinterList();
     bool TestConnection();
     void SetGetLabelDefs(int action);
+    // The captions of the label fields, LblFldDesc(0) on, in field index order.
+    QStringList fieldCaptions() const;
     // The one place that fills the lists whose entries come from the ERP.
     void FillErpLists();
     // Fills them again after a new connection, keeping or loading their positions.
