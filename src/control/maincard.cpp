@@ -555,15 +555,17 @@ void MainCard::cmdPrintDocButt_Click()
     printLabels(2);
 }
 
-void MainCard::printLabels(int queryType)
+// The label data ready for a query of this type: the data folder repaired
+// and, for labels by items, the documents database that links the item
+// tables. False once the user was told why not.
+bool MainCard::prepareLabelData(int queryType)
 {
-    const short code = GetOLEOption();
     const QString tempDocs = dataFile(dbfiles::TempDocs);
     // A file whose creation was cut short (an earlier version made files in
     // place) is completed before the query trusts it.
     if (DbError error = RepairDataFolder(ui->txtDBPath->text())) {
         m_services.prompt->critical(titles::Fault, error.message);
-        return;
+        return false;
     }
     // Labels by items need the documents database only for its links to the
     // item tables; a first run on a new data folder gets the whole folder ready.
@@ -573,10 +575,17 @@ void MainCard::printLabels(int queryType)
             CreateTempDocsDB(dataFile(dbfiles::Config), dataFile(dbfiles::Items), tempDocs, &error);
         if (error) {
             m_services.prompt->critical(titles::Fault, error.message);
-            return;
+            return false;
         }
     }
-    if (!caselessKeys(dataFile(dbfiles::Items)) || !caselessKeys(tempDocs))
+    return caselessKeys(dataFile(dbfiles::Items)) && caselessKeys(tempDocs);
+}
+
+void MainCard::printLabels(int queryType)
+{
+    const short code = GetOLEOption();
+    const QString tempDocs = dataFile(dbfiles::TempDocs);
+    if (!prepareLabelData(queryType))
         return;
     const QString labelFile
         = control<QLabel>(queryType == 1 ? QStringLiteral("lblLabelName(1)") : QStringLiteral("lblLabelName(2)"))
@@ -764,8 +773,10 @@ void MainCard::cmdLabByPlate_Click()
 
 void MainCard::cmdPreview_Click(int index)
 {
-    const QString tempDocs = dataFile(dbfiles::TempDocs);
-    ShowItemList(index == 0 ? 2 : 1, tempDocs);
+    const int queryType = index == 0 ? 2 : 1;
+    // The list reads what printing would: the same data, made ready the same way.
+    if (prepareLabelData(queryType))
+        ShowItemList(uchar(queryType), dataFile(dbfiles::TempDocs));
 }
 
 } // namespace tagora

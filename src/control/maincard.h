@@ -1,6 +1,7 @@
 #pragma once
 
 #include "erp/odbc.h"
+#include "labels/itemquery.h"
 #include "platform/progress.h"
 #include "platform/services.h"
 
@@ -199,6 +200,12 @@ private:
     // The label field table as the label-list query reads it.
     std::vector<PlateFieldRow> plateFieldRows() const;
     void ShowItemList(uchar queryType, const QString& dbPath);
+    bool prepareLabelData(int queryType);
+    // The settings the label-data query is built from; greySent counts a grey
+    // send box as ticked, as the item list does.
+    LabelQuerySettings labelQuerySettings(bool greySent) const;
+    // Writes the item list; empty text on success.
+    QString writeItemList(const QString& fileName, const QString& dbPath, uchar queryType, uchar orderBy);
     void ImportItems();
     void ImportDocuments();
     void PrintFromLabelList();

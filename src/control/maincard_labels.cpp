@@ -26,25 +26,31 @@ const QString kJournalKey = QStringLiteral("JournalFile");
 
 // The ticks and expressions of the label field table, read the same way for
 // the query and for the fields a run sends, so the two agree on every column.
-void readFieldRows(const MainCard& card, LabelQuerySettings& s)
+void readFieldRows(const MainCard& card, LabelQuerySettings& s, bool greySent = false)
 {
     for (int row = 0; row < LabelFieldCount; ++row) {
-        s.sent[size_t(row)] = card.control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState() == Qt::Checked;
+        const Qt::CheckState state = card.control<QCheckBox>(QStringLiteral("ChkFldSend(%1)").arg(row))->checkState();
+        s.sent[size_t(row)] = state == Qt::Checked || (greySent && state == Qt::PartiallyChecked);
         if (auto* expr = card.control<QLineEdit>(QStringLiteral("txtFldExpr(%1)").arg(row)))
             s.expressions[size_t(row)] = expr->text();
     }
 }
 } // namespace
 
-QVariant MainCard::BuildItemQuery(uchar pQueryType, uchar pOrderBy)
+LabelQuerySettings MainCard::labelQuerySettings(bool greySent) const
 {
     LabelQuerySettings s;
-    readFieldRows(*this, s);
+    readFieldRows(*this, s, greySent);
     s.useAccountKey = ui->ChkUseAccountKey->checkState() == Qt::Checked;
     s.accountKey = ui->txtAccountKey->text();
     s.companyName = ui->txtCompanyName->text();
     s.itemRangeCriteria = itemRangeCriteria();
-    return QVariant(tagora::BuildItemQuery(s, pQueryType, pOrderBy));
+    return s;
+}
+
+QVariant MainCard::BuildItemQuery(uchar pQueryType, uchar pOrderBy)
+{
+    return QVariant(tagora::BuildItemQuery(labelQuerySettings(false), pQueryType, pOrderBy));
 }
 
 QString MainCard::labelQueryProblem() const

@@ -3,18 +3,19 @@
 #include "erp/textconv.h"
 #include "labels/barcode.h"
 #include "labels/numberformat.h"
+#include "labels/pagewriter.h"
 #include "localdb/database.h"
 #include "platform/progress.h"
 
 #include <QDir>
 #include <QFile>
 #include <QFileInfo>
-#include <QSaveFile>
 #include <QSet>
 #include <QRegularExpression>
+#include <QSize>
+#include <cmath>
 #include <QStandardPaths>
 #include <QThread>
-#include <QStringEncoder>
 
 #ifdef Q_OS_UNIX
 #include <atomic>
@@ -42,73 +43,8 @@ template <size_t N> QString nameOf(const char* const (&names)[N], int i)
 
 QString escaped(const QString& text)
 {
-    return text.toHtmlEscaped().replace(QLatin1Char('\''), QLatin1String("&#39;"));
+    return HtmlText(text);
 }
-
-// The page's lines, in the code page it declares, each with CRLF. A character
-// the code page lacks goes as a numeric reference rather than a question mark.
-// The page is written aside and takes its name only when whole: a failure
-// leaves neither a cut page nor a stray file, and an earlier page at that
-// name stays until a whole one replaces it.
-class PageWriter {
-public:
-    explicit PageWriter(const QString& path)
-        : m_file(path)
-    {
-    }
-
-    bool open() { return m_file.open(QIODevice::WriteOnly); }
-
-    void line(const QString& text) { write(text + QStringLiteral("\r\n")); }
-
-    void write(const QString& text)
-    {
-        QByteArray bytes = m_encoder.encode(text);
-        if (m_encoder.hasError()) {
-            bytes.clear();
-            // One reference per character: a surrogate pair is one code point.
-            for (int i = 0; i < text.size(); ++i) {
-                const bool pair = text[i].isHighSurrogate() && i + 1 < text.size() && text[i + 1].isLowSurrogate();
-                const QString one = pair ? text.mid(i, 2) : text.mid(i, 1);
-                QStringEncoder single("windows-1255");
-                QByteArray b = single.encode(one);
-                if (single.hasError())
-                    b = "&#" + QByteArray::number(one.toUcs4().value(0)) + ';';
-                bytes += b;
-                if (pair)
-                    ++i;
-            }
-            m_encoder.resetState();
-        }
-        // The buffer hides a failed write from write()'s count; the device's
-        // error shows it once the buffer was flushed.
-        if (!m_failed && (m_file.write(bytes) != bytes.size() || m_file.error() != QFileDevice::NoError))
-            m_failed = true;
-    }
-
-    // A write that failed (a full disk) fails the page: the rest need not be made.
-    bool failed() const { return m_failed; }
-
-    // Puts the page in place; false, with the page left out, when any write failed.
-    bool commit()
-    {
-        // QSaveFile (Qt 6.4) commits a page whose last buffer the disk refused
-        // (a file size limit, a full disk): the flush is asked first.
-        if (!m_failed && !m_file.flush())
-            m_failed = true;
-        if (m_failed) {
-            m_file.cancelWriting();
-            m_file.commit();
-            return false;
-        }
-        return m_file.commit();
-    }
-
-private:
-    QSaveFile m_file;
-    QStringEncoder m_encoder{"windows-1255"};
-    bool m_failed = false;
-};
 
 QString pictureAttributes(const LabelBarDef& bar)
 {
@@ -118,6 +54,60 @@ QString pictureAttributes(const LabelBarDef& bar)
     if (bar.UserResoY > 0)
         a += QStringLiteral(" height=") + QString::number(bar.UserResoY);
     return a;
+}
+
+// The width and height of a BMP file as its header gives them, or nothing.
+QSize bmpSize(const QString& path)
+{
+    QFile f(path);
+    if (!f.open(QIODevice::ReadOnly))
+        return {};
+    const QByteArray head = f.read(26);
+    if (head.size() < 26 || !head.startsWith("BM"))
+        return {};
+    auto int32 = [&](int at) {
+        return qint32(quint32(uchar(head[at])) | quint32(uchar(head[at + 1])) << 8 | quint32(uchar(head[at + 2])) << 16
+                      | quint32(uchar(head[at + 3])) << 24);
+    };
+    const qint32 w = int32(18);
+    const qint32 h = int32(22);
+    if (w <= 0 || h == 0 || w > 100000 || h > 100000 || h < -100000)
+        return {};
+    return QSize(w, h < 0 ? -h : h);
+}
+
+// What a barcode cell holds when its record has no picture (no value, or one
+// the symbology refused): nothing, in the space a picture takes, so the
+// label's other lines stay where they are. The space is the size the
+// pictures are shown at, else that of a picture drawn for another record of
+// the same line; with neither, the cell is simply empty.
+QString emptyPictureCell(const LabelBarDef& bar, const QDir& folder, int fieldIndex)
+{
+    QSize size(bar.UserResoX > 0 ? bar.UserResoX : 0, bar.UserResoY > 0 ? bar.UserResoY : 0);
+    if (size.width() == 0 || size.height() == 0) {
+        const QString pattern = QStringLiteral("B%1*.BMP").arg(fieldIndex, 2, 10, QLatin1Char('0'));
+        for (const QString& name : folder.entryList({pattern}, QDir::Files)) {
+            const QSize drawn = bmpSize(folder.filePath(name));
+            if (drawn.isEmpty())
+                continue;
+            // One side given: the other keeps the picture's proportions, as the browser scales it.
+            if (size.width() > 0)
+                size.setHeight(int(std::lround(double(drawn.height()) * size.width() / drawn.width())));
+            else if (size.height() > 0)
+                size.setWidth(int(std::lround(double(drawn.width()) * size.height() / drawn.height())));
+            else
+                size = drawn;
+            break;
+        }
+    }
+    if (size.width() <= 0 && size.height() <= 0)
+        return QStringLiteral("&nbsp;");
+    QString style;
+    if (size.width() > 0)
+        style += QStringLiteral("width:%1px;").arg(size.width());
+    if (size.height() > 0)
+        style += QStringLiteral(" height:%1px;").arg(size.height());
+    return QStringLiteral("<div style='display:inline-block; ") + style.trimmed() + QStringLiteral("'></div>");
 }
 
 int copiesOf(const QVariant& v)
@@ -216,11 +206,13 @@ QString directJobFolder()
 
 namespace {
 // What a job leaves in the folder: the page and the barcode pictures named by
-// field and record (B0400012.BMP). Nothing else there is ours to remove.
+// field and record (B0400012.BMP), and the item list. Nothing else there is
+// ours to remove.
 bool isJobFile(const QString& name)
 {
     static const QRegularExpression picture(QStringLiteral("^B[0-9]{7,}\\.BMP$"));
-    return name == QLatin1String("tgrlab1.htm") || picture.match(name).hasMatch();
+    return name == QLatin1String("tgrlab1.htm") || name == QLatin1String("tgrlab2.htm")
+        || picture.match(name).hasMatch();
 }
 
 #ifdef Q_OS_UNIX
@@ -553,6 +545,15 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
     const QString height = QStringLiteral("height='") + cellPercent(page.PageRows) + QStringLiteral("%'");
     const QString width = QStringLiteral("width='") + cellPercent(page.PageCols) + QStringLiteral("%'");
     const QString picture = pictureAttributes(layout.bar);
+    // The pictures sit beside the page; a record whose picture was not drawn
+    // gets no reference to one.
+    const QDir pictures = QFileInfo(fileName).absoluteDir();
+    std::array<QString, kDirectLines> noPicture;
+    for (int i = 0; i < kDirectLines; ++i) {
+        const LabelLineDef& l = layout.lines[size_t(i)];
+        if (l.UseCell && l.ViewType == 1)
+            noPicture[size_t(i)] = emptyPictureCell(layout.bar, pictures, l.FldID);
+    }
     const QString format = priceFormat.trimmed().isEmpty() ? QStringLiteral("0.00") : priceFormat.trimmed();
 
     const QString writeFailed = QStringLiteral("כתיבת הקובץ '%1' נכשלה (ייתכן שהדיסק מלא), ולכן לא הודפסו מדבקות")
@@ -653,13 +654,16 @@ QString CreateLabPage(const QString& fileName, const QString& dbPath, const QStr
                         const LabelLineDef& l = layout.lines[size_t(i)];
                         if (!l.UseCell)
                             continue;
-                        if (l.ViewType == 1 && !makesPicture(records, columns[size_t(i)]))
-                            // Nothing to draw: an empty cell, not a broken picture on paper.
-                            out.line(QStringLiteral("    <tr align='center'><td class='L%1'>&nbsp;</td></tr>").arg(i));
+                        const QString pictureName = l.ViewType == 1 && makesPicture(records, columns[size_t(i)])
+                            ? BarcodeImageName(l.FldID, int(recordNumber))
+                            : QString();
+                        if (l.ViewType == 1 && (pictureName.isEmpty() || !pictures.exists(pictureName)))
+                            // Nothing drawn: an empty cell, not a broken picture on paper.
+                            out.line(QStringLiteral("    <tr align='center'><td class='L%1'>").arg(i)
+                                     + noPicture[size_t(i)] + QStringLiteral("</td></tr>"));
                         else if (l.ViewType == 1)
                             out.line(QStringLiteral("    <tr align='center'><td class='L%1'><img src='").arg(i)
-                                     + BarcodeImageName(l.FldID, int(recordNumber)) + QLatin1Char('\'') + picture
-                                     + QStringLiteral("></img></td></tr>"));
+                                     + pictureName + QLatin1Char('\'') + picture + QStringLiteral("></img></td></tr>"));
                         else if (l.ViewType == 0)
                             out.line(QStringLiteral("    <tr align='center'><td class='L%1'>").arg(i)
                                      + lineText(l, i, records, columns[size_t(i)], format, coinColumn, page.MaxTextLen,

@@ -34,6 +34,8 @@ QProcessEnvironment cliEnvironment(const QString& settings)
     env.insert("XDG_CONFIG_HOME", home + "/config");
     env.insert("XDG_DATA_HOME", home + "/data");
     env.remove("TAGORA_SETTINGS");
+    // The job folder of pages and pictures, private to the test too.
+    env.insert("Temp", home + "/temp");
     return env;
 }
 
@@ -410,6 +412,37 @@ private slots:
                 labels += line.section('|', 1, 1).toInt();
         }
         QCOMPARE(int(page.count("<img src=")), labels);
+    }
+
+    // The list buttons: the page of the records a print would produce, in
+    // the job folder, its path printed as the page the browser would show.
+    void itemListPage_data()
+    {
+        QTest::addColumn<QByteArray>("script");
+        QTest::addColumn<bool>("listed");
+        QTest::newRow("items tab") << QByteArray("set \"ChkFldSend(0)\" 1\nclick \"cmdPreview(1)\"\n") << true;
+        QTest::newRow("nothing marked") << QByteArray("set \"ChkFldSend(0)\" 1\nclick \"cmdPreview(1)\"\n") << false;
+    }
+    void itemListPage()
+    {
+        QFETCH(QByteArray, script);
+        QFETCH(bool, listed);
+        const QString demo = dir.filePath(listed ? "list-demo1" : "list-demo2");
+        Run r = runCli(settings(), {"--demo", demo, "--script", "-"}, "set cmbPriceField 1\nclick CmdImportItems\n");
+        QVERIFY2(r.exitCode == 0, qPrintable(r.err.join('\n')));
+        if (listed)
+            QVERIFY(!execOn(demo + "/data/" + dbfiles::Items, "UPDATE tItems SET PrintLabel = 1, Copies = 2"));
+        r = runCli(settings(), {"--demo", demo, "--script", "-"}, script);
+        QVERIFY2(r.exitCode == 0, qPrintable((r.out + r.err).join('\n')));
+        const QString page = QFileInfo(settings()).absolutePath() + "/temp/tgrlab/tgrlab2.htm";
+        QCOMPARE(r.out.filter(QRegularExpression("^page: ")), QStringList{"page: " + page});
+        const QString text = QStringDecoder("windows-1255").decode(readAll(page));
+        QVERIFY(text.startsWith("<HTML>\r\n"));
+        const int items = scalar(demo + "/data/" + dbfiles::Items, "SELECT count(*) FROM tItems").toInt();
+        QVERIFY(items > 0);
+        // A row per item, its copies last; the heading row holds the captions.
+        QCOMPARE(int(text.count("  <td>2</td>\r\n </tr>")), listed ? items : 0);
+        QCOMPARE(text.endsWith("</HTML>\r\n"), listed);
     }
 
     // The whole road by items, scripted: import, select (find, mark, copies), print.

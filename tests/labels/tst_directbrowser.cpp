@@ -3,6 +3,7 @@
 #include "support/cardfixture.h"
 #include "support/dbrows.h"
 #include "support/erpfixture.h"
+#include "support/labeldata.h"
 
 #include "erp/connparams.h"
 #include "erp/itemimport.h"
@@ -75,6 +76,44 @@ private slots:
         QStringList decoded = QString::fromUtf8(reader.readAllStandardOutput()).split('\n', Qt::SkipEmptyParts);
         decoded.sort();
         QCOMPARE(decoded, expected);
+    }
+
+    // Labels whose barcode was refused or has no value: the browser, loading
+    // the page as it stands, finds every picture it references.
+    void noBrokenPictureWithoutBarcode()
+    {
+        const QString chromium = QStandardPaths::findExecutable("chromium");
+        QVERIFY2(!chromium.isEmpty(), "chromium is installed by the setup");
+        LabelData data("UPDATE tItems SET BarCode = '729000000001X' WHERE ItemKey = 'A2'");
+        const QString temp = work.filePath("temp-refused");
+        qputenv("Temp", temp.toUtf8());
+        CardFixture f(QStringLiteral("[GeneralParams]\nDBPath=%1\nOptOLE3=True\nOptOLE0=False\n"
+                                     "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n"
+                                     "[LabelBar]\nBarType=6\nUserResoX=0\nUserResoY=0\n").arg(data.folder).toUtf8());
+        f.card->control<QPushButton>("cmdPrintItmes")->click();
+        qunsetenv("Temp");
+        directLabelLayout() = DirectLabelLayout{};
+        QCOMPARE(f.pages->shown.size(), 1);
+
+        // A page beside it loads the labels and counts their pictures, loaded and broken.
+        const QString folder = QFileInfo(f.pages->shown.first()).absolutePath();
+        const QString probe = folder + "/probe.htm";
+        QFile p(probe);
+        QVERIFY(p.open(QIODevice::WriteOnly));
+        p.write("<html><body><iframe id=f src='tgrlab1.htm' onload=\"var d=document.getElementById('f').contentDocument;"
+                "var ok=0,bad=0;for(var i of d.images){if(i.complete&&i.naturalWidth>0)ok++;else bad++;}"
+                "document.title='pictures '+ok+' broken '+bad;\"></iframe></body></html>");
+        p.close();
+        QProcess browser;
+        browser.start(chromium, {"--headless", "--no-sandbox", "--disable-gpu", "--no-first-run",
+                                 "--allow-file-access-from-files", "--disable-background-networking",
+                                 "--user-data-dir=" + work.filePath("profile2"), "--virtual-time-budget=10000",
+                                 "--dump-dom", QUrl::fromLocalFile(probe).toString()});
+        QVERIFY(browser.waitForFinished(120000));
+        const QString dom = QString::fromUtf8(browser.readAllStandardOutput());
+        // A1 prints twice with its picture; A2 (refused) and B1 (no value) without.
+        QVERIFY2(dom.contains("<title>pictures 2 broken 0</title>"), qPrintable(dom.left(400)));
+        QFile::remove(probe);
     }
 };
 

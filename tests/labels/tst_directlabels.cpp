@@ -15,6 +15,7 @@
 #include <QPushButton>
 #include <QRadioButton>
 #include <QStringDecoder>
+#include <QtEndian>
 #include <QtTest>
 
 #include <map>
@@ -133,16 +134,19 @@ private slots:
         layout.lines[0] = textLine(0, "ItemKey");
         layout.lines[1] = textLine(4, "BarCode");
         layout.lines[1].ViewType = 1;
+        // The picture drawn for A1 (not a BMP: no size to keep for the others).
+        writeFile(work.filePath("B0400001.BMP"), "picture");
         const QString html = page(data, layout, " And ItemKey <= 'B1'");
         QCOMPARE(html.count("<table height='100%' width='100%' border='0'>"), 2);
         QCOMPARE(html.count("<td class='L0'>"), 7);
         QCOMPARE(html.count("<tr><td nowrap>&nbsp;</td></tr>"), 1);
         QVERIFY(html.lastIndexOf("&nbsp;</td></tr>") > html.lastIndexOf("<td class='L0'>"));
         // One picture name per record, however many copies; a record with no
-        // barcode value (B1) gets empty cells rather than a broken picture.
+        // barcode value (B1), or whose picture was not drawn (A2), gets empty
+        // cells of the picture's size rather than a broken picture.
         QCOMPARE(html.count("B0400001.BMP"), 2);
         QCOMPARE(html.count("B0400003.BMP"), 0);
-        QCOMPARE(html.count("<td class='L1'>&nbsp;</td>"), 4);
+        QCOMPARE(html.count("<td class='L1'><div style='display:inline-block; width:100px; height:50px;'></div></td>"), 5);
         QCOMPARE(html.count("\r\n"), html.count('\n'));
         QVERIFY(html.endsWith("</BODY>\r\n</HTML>\r\n"));
     }
@@ -231,6 +235,7 @@ private slots:
         layout.bar.UserResoY = short(resoY);
         layout.lines[0] = textLine(4, "BarCode");
         layout.lines[0].ViewType = 1;
+        writeFile(work.filePath("B0400001.BMP"), "picture");
         const QString html = page(data, layout, " And ItemKey = 'A1'");
         for (const QString& e : expected)
             QVERIFY2(html.contains(e), qPrintable(e));
@@ -382,7 +387,7 @@ private slots:
     {
         LabelData data("UPDATE tItems SET BarCode = '729000000001X', Copies = 4 WHERE ItemKey = 'A2'");
         const auto f = directCard(data, work.filePath("temp-refused"),
-                                  "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=6\n");
+                                  "[LabelDef0]\nUseCell=-1\nFldID=4\nViewType=1\n[LabelBar]\nBarType=6\nUserResoX=0\nUserResoY=0\n");
         f->c<QPushButton>("cmdPrintItmes")->click();
         QCOMPARE(f->pages->shown.size(), 1);
         // A roll takes B1 (no barcode), A2 (refused), A1: one picture, A1's.
@@ -394,6 +399,24 @@ private slots:
         QVERIFY2(shown.startsWith(QString::fromUtf8("שימו לב: 4 מתוך 9 המדבקות שבדף")), qPrintable(shown));
         QVERIFY2(shown.contains("729000000001X") && shown.contains("EAN-13"), qPrintable(shown));
         QVERIFY2(!shown.contains(QRegularExpression("Error|Invalid|digits")), qPrintable(shown));
+
+        // The page references only pictures that are there; A2 (refused) and
+        // B1 (no value) keep the space of A1's picture, so the sheet does not shift.
+        const QString html = readPage(f->pages->shown.first());
+        static const QRegularExpression img("<img src='([^']*)'");
+        QStringList referenced;
+        for (auto it = img.globalMatch(html); it.hasNext();)
+            referenced << it.next().captured(1);
+        QCOMPARE(referenced, QStringList({"B0400003.BMP", "B0400003.BMP"}));
+        const QString picture = QFileInfo(f->pages->shown.first()).absolutePath() + "/B0400003.BMP";
+        const QByteArray bmp = readFile(picture);
+        QVERIFY(bmp.startsWith("BM"));
+        const int width = qFromLittleEndian<qint32>(bmp.constData() + 18);
+        const int height = qAbs(qFromLittleEndian<qint32>(bmp.constData() + 22));
+        const QString kept = QStringLiteral("<td class='L0'><div style='display:inline-block; width:%1px; height:%2px;'></div></td>")
+                                 .arg(width)
+                                 .arg(height);
+        QCOMPARE(html.count(kept), 4 + 3);
     }
 
     // A disk that fills up during the job: the pictures or the page cannot be
