@@ -1,5 +1,6 @@
 #include "dialogs/frmlabdef.h"
 
+#include "labels/barcode.h"
 #include "platform/clicklabel.h"
 #include "platform/prompt.h"
 
@@ -9,6 +10,12 @@
 #include <QComboBox>
 #include <QGridLayout>
 #include <QLineEdit>
+#include <QPixmap>
+#include <QProcess>
+#include <QStandardPaths>
+#include <QTemporaryDir>
+#include <QTimer>
+#include <QUrl>
 #include <cmath>
 #include <limits>
 #include <optional>
@@ -75,12 +82,134 @@ FrmLabDef::FrmLabDef(DirectLabelLayout& layout, const QStringList& fieldCaptions
     connect(ui->SSTab1, &QTabWidget::currentChanged, this, &FrmLabDef::SSTab1_Click);
 
     ui->SSTab1->setCurrentIndex(0);
+    m_fieldCaptions = fieldCaptions;
     FillXFld(fieldCaptions);
     FillCombos();
     GetSetFormLabDefs(1);
+
+    // The preview follows the boxes, but only once the typing stops: each
+    // drawing starts a browser.
+    m_previewTimer = new QTimer(this);
+    m_previewTimer->setSingleShot(true);
+    m_previewTimer->setInterval(300);
+    connect(m_previewTimer, &QTimer::timeout, this, [this] {
+        if (ui->SSTab1->currentWidget() == ui->tabPreview)
+            refreshPreview();
+    });
+    for (QComboBox* c : findChildren<QComboBox*>())
+        connect(c, &QComboBox::currentIndexChanged, this, &FrmLabDef::schedulePreview);
+    for (QLineEdit* e : findChildren<QLineEdit*>())
+        connect(e, &QLineEdit::textChanged, this, &FrmLabDef::schedulePreview);
+    for (QCheckBox* c : findChildren<QCheckBox*>())
+        connect(c, &QCheckBox::stateChanged, this, &FrmLabDef::schedulePreview);
 }
 
-FrmLabDef::~FrmLabDef() = default;
+FrmLabDef::~FrmLabDef()
+{
+    if (m_browser) {
+        m_browser->disconnect(this);
+        m_browser->kill();
+        m_browser->waitForFinished(2000);
+    }
+}
+
+void FrmLabDef::setPreviewSource(PreviewSource source, const QString& priceFormat)
+{
+    m_previewSource = std::move(source);
+    m_priceFormat = priceFormat;
+    schedulePreview();
+}
+
+void FrmLabDef::schedulePreview()
+{
+    m_previewTimer->start();
+}
+
+void FrmLabDef::refreshPreview()
+{
+    const int generation = ++m_previewGeneration;
+    m_previewPng.clear();
+    // A drawing of an older layout is of no use any more.
+    if (m_browser) {
+        m_browser->disconnect(this);
+        m_browser->kill();
+        connect(m_browser, &QProcess::finished, m_browser, &QObject::deleteLater);
+        m_browser = nullptr;
+    }
+    // The boxes as they stand, read quietly: a box still being typed in is no fault yet.
+    DirectLabelLayout staged = m_layout;
+    for (const Binding& b : bindings(staged)) {
+        if (!GetSetFormLabDef(2, b.control, b.field))
+            return previewDone(generation, false,
+                               QStringLiteral("אין תצוגה מקדימה: הערך בשדה \"%1\" אינו תקין.").arg(b.description));
+    }
+    QVector<PreviewField> fields;
+    if (m_previewSource)
+        fields = m_previewSource();
+    if (fields.isEmpty()) {
+        for (int k = 0; k < m_fieldCaptions.size(); ++k)
+            fields.push_back({QStringLiteral("F%1").arg(k), false, QStringLiteral("1234567890")});
+    }
+    if (!m_previewDir || !m_previewDir->isValid())
+        m_previewDir = std::make_unique<QTemporaryDir>();
+    if (!m_previewDir->isValid())
+        return previewDone(generation, false, QStringLiteral("אין תצוגה מקדימה: לא ניתן ליצור תיקייה זמנית."));
+    const QString folder = m_previewDir->filePath(QStringLiteral("page"));
+    QString page;
+    ZintBarcodeLibrary library;
+    if (const QString why = WritePreviewPage(folder, staged, fields, m_priceFormat, library, &page); !why.isEmpty())
+        return previewDone(generation, false, QStringLiteral("אין תצוגה מקדימה: ") + why);
+
+    QString chromium;
+    for (const char* name : {"chromium", "chromium-browser", "google-chrome"}) {
+        chromium = QStandardPaths::findExecutable(QLatin1String(name));
+        if (!chromium.isEmpty())
+            break;
+    }
+    if (chromium.isEmpty())
+        return previewDone(generation, false,
+                           QStringLiteral("אין תצוגה מקדימה: הדפדפן Chromium אינו מותקן במחשב זה."));
+    // Each drawing gets its own picture name: a picture still being written
+    // by a browser that was stopped is never taken for the new one.
+    const QString png = m_previewDir->filePath(QStringLiteral("preview%1.png").arg(generation));
+    QFile::remove(png);
+    ui->lblPreview->setText(QStringLiteral("התצוגה המקדימה נוצרת..."));
+    m_browser = new QProcess(this);
+    connect(m_browser, &QProcess::finished, this, [this, generation, png](int code, QProcess::ExitStatus status) {
+        m_browser->deleteLater();
+        m_browser = nullptr;
+        const bool ok = status == QProcess::NormalExit && code == 0 && QFile::exists(png);
+        if (ok)
+            m_previewPng = png;
+        previewDone(generation, ok, ok ? QString() : QStringLiteral("אין תצוגה מקדימה: הדפדפן לא הצליח לצייר את המדבקה."));
+    });
+    connect(m_browser, &QProcess::errorOccurred, this, [this, generation](QProcess::ProcessError error) {
+        if (error != QProcess::FailedToStart)
+            return;
+        m_browser->deleteLater();
+        m_browser = nullptr;
+        previewDone(generation, false, QStringLiteral("אין תצוגה מקדימה: לא ניתן להפעיל את הדפדפן Chromium."));
+    });
+    m_browser->start(chromium, {QStringLiteral("--headless"), QStringLiteral("--no-sandbox"),
+                                QStringLiteral("--disable-gpu"), QStringLiteral("--no-first-run"),
+                                QStringLiteral("--disable-background-networking"),
+                                QStringLiteral("--disable-component-update"), QStringLiteral("--disable-sync"),
+                                QStringLiteral("--hide-scrollbars"),
+                                QStringLiteral("--user-data-dir=") + m_previewDir->filePath(QStringLiteral("profile")),
+                                QStringLiteral("--window-size=600,400"), QStringLiteral("--screenshot=") + png,
+                                QUrl::fromLocalFile(page).toString()});
+}
+
+void FrmLabDef::previewDone(int generation, bool ok, const QString& why)
+{
+    if (generation != m_previewGeneration)
+        return;
+    if (ok)
+        ui->lblPreview->setPixmap(QPixmap(m_previewPng));
+    else
+        ui->lblPreview->setText(why);
+    emit previewFinished(ok);
+}
 
 // The seven line rows of the first and third tabs, under the column captions
 // the form lays out.
@@ -399,6 +528,8 @@ void FrmLabDef::lblDel_Click(int index)
 // The design rows name the field each of them styles.
 void FrmLabDef::SSTab1_Click(int tab)
 {
+    if (ui->SSTab1->widget(tab) == ui->tabPreview)
+        schedulePreview();
     if (tab != 2)
         return;
     for (LineRow& r : m_rows)

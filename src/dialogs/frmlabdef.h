@@ -1,10 +1,12 @@
 #pragma once
 
 #include "labels/directlayout.h"
+#include "labels/labelpreview.h"
 
 #include <QDialog>
 #include <QString>
 #include <QStringList>
+#include <functional>
 #include <memory>
 #include <variant>
 #include <vector>
@@ -13,6 +15,9 @@ class QCheckBox;
 class QComboBox;
 class QLabel;
 class QLineEdit;
+class QProcess;
+class QTemporaryDir;
+class QTimer;
 class QWidget;
 
 namespace Ui {
@@ -51,6 +56,19 @@ public:
     void lblAdd_Click(int index);
     void lblDel_Click(int index);
 
+    // The record the preview shows, fields by field index: the first marked
+    // item, or sample values. Without one every field shows a sample number.
+    using PreviewSource = std::function<QVector<PreviewField>()>;
+    void setPreviewSource(PreviewSource source, const QString& priceFormat);
+    // Draws the preview now, whatever tab is shown; it is ready when
+    // previewFinished comes.
+    void refreshPreview();
+    // The picture of the last preview drawn; empty when it could not be.
+    QString previewPicture() const { return m_previewPng; }
+
+signals:
+    void previewFinished(bool drawn);
+
 private:
     using FieldRef = std::variant<bool*, uchar*, short*, float*, QString*>;
     struct Binding {
@@ -85,11 +103,21 @@ private:
     static bool GetSetFormLabDef(int action, QWidget* pObject, const FieldRef& pProperty, QString* wanted = nullptr);
     void SSTab1_Click(int tab);
     void cmdClose_Click();
+    void schedulePreview();
+    void previewDone(int generation, bool ok, const QString& why);
 
     std::unique_ptr<Ui::FrmLabDefForm> ui;
     DirectLabelLayout& m_layout;
     std::shared_ptr<Prompt> m_prompt;
     std::vector<LineRow> m_rows;
+    QStringList m_fieldCaptions;
+    PreviewSource m_previewSource;
+    QString m_priceFormat;
+    QTimer* m_previewTimer = nullptr;
+    QProcess* m_browser = nullptr;
+    std::unique_ptr<QTemporaryDir> m_previewDir;
+    QString m_previewPng;
+    int m_previewGeneration = 0;
 };
 
 } // namespace tagora

@@ -6,7 +6,11 @@
 #include <QComboBox>
 #include <QLabel>
 #include <QLineEdit>
+#include <QProcess>
 #include <QPushButton>
+#include <QSignalSpy>
+#include <QStandardPaths>
+#include <QTemporaryDir>
 #include <QTabWidget>
 #include <QtTest>
 #include <map>
@@ -56,6 +60,30 @@ template <class T> T* c(QWidget& w, const QString& name)
 }
 
 QString row(const char* base, int i) { return QStringLiteral("%1(%2)").arg(QLatin1String(base)).arg(i); }
+
+// A name line over a Code 128 barcode of field 1, shown at the picture's own size.
+DirectLabelLayout twoLineLayout()
+{
+    DirectLabelLayout l;
+    l.lines[0].UseCell = true;
+    l.lines[0].FldID = 0;
+    l.lines[0].ViewType = 0;
+    l.lines[1].UseCell = true;
+    l.lines[1].FldID = 1;
+    l.lines[1].ViewType = 1;
+    l.bar.BarType = 2;
+    l.bar.DimX = 0.01f;
+    l.bar.BarHeight = 0.3f;
+    l.bar.UserResoX = 0;
+    l.bar.UserResoY = 0;
+    return l;
+}
+
+QVector<PreviewField> previewRecord(const QString& barcode)
+{
+    return {{QStringLiteral("VNItemName"), false, QStringLiteral("פריט לדוגמה")},
+            {QStringLiteral("BarCode"), false, barcode}};
+}
 } // namespace
 
 class TestLabDef : public QObject {
@@ -63,6 +91,48 @@ class TestLabDef : public QObject {
     std::shared_ptr<ScriptedPrompt> prompt = std::make_shared<ScriptedPrompt>(nullptr);
 
 private slots:
+    // The preview is the engine's own page as a browser draws it: its
+    // barcode reads back as the record's value.
+    void previewBarcodeReadsBack()
+    {
+        const QString zbarimg = QStandardPaths::findExecutable("zbarimg");
+        if (QStandardPaths::findExecutable("chromium").isEmpty() || zbarimg.isEmpty())
+            QSKIP("chromium or zbarimg is not installed");
+        DirectLabelLayout layout = twoLineLayout();
+        FrmLabDef d(layout, captions(), nullptr);
+        d.setPreviewSource([] { return previewRecord(QStringLiteral("TAGORA-12345")); }, QString());
+        QSignalSpy done(&d, &FrmLabDef::previewFinished);
+        d.refreshPreview();
+        QVERIFY(done.wait(120000));
+        QVERIFY2(done.last().at(0).toBool(), qPrintable(c<QLabel>(d, "lblPreview")->text()));
+        QVERIFY(!c<QLabel>(d, "lblPreview")->pixmap().isNull());
+
+        QProcess reader;
+        reader.start(zbarimg, {"-q", d.previewPicture()});
+        QVERIFY(reader.waitForFinished(60000));
+        QCOMPARE(QString::fromUtf8(reader.readAllStandardOutput()).trimmed(), QStringLiteral("CODE-128:TAGORA-12345"));
+    }
+
+    // Without a browser the preview says why, and the dialog goes on working.
+    void previewWithoutBrowser()
+    {
+        QTemporaryDir empty;
+        const QByteArray path = qgetenv("PATH");
+        qputenv("PATH", empty.path().toUtf8());
+        DirectLabelLayout layout = twoLineLayout();
+        FrmLabDef d(layout, captions(), nullptr);
+        d.setPreviewSource([] { return previewRecord(QStringLiteral("TAGORA-1")); }, QString());
+        QSignalSpy done(&d, &FrmLabDef::previewFinished);
+        d.refreshPreview();
+        qputenv("PATH", path);
+        QVERIFY(done.count() == 1 || done.wait(10000));
+        QVERIFY(!done.last().at(0).toBool());
+        QVERIFY(c<QLabel>(d, "lblPreview")->text().contains(QStringLiteral("Chromium")));
+        c<QLineEdit>(d, row("txtPrefix", 0))->setText(QStringLiteral("שם:"));
+        c<QPushButton>(d, "cmdClose")->click();
+        QCOMPARE(layout.lines[0].Prefix, QStringLiteral("שם:"));
+    }
+
     void init() { prompt->clear(); }
 
     // No stored values: the defaults reach the boxes, and confirming them
