@@ -23,6 +23,8 @@ import subprocess
 import sys
 import tempfile
 
+from checkrun import finish, run_cli, write_odbc, write_settings
+
 EPOCH = dt.datetime(1988, 1, 1)
 BOUNDARY = dt.date(2026, 3, 15)  # the day the date ranges of the runs cut across
 
@@ -357,22 +359,10 @@ def expected(erp_path, config_rows, ranges, account_defs, settings, conn_type):
 # ------------------------------------------------------------ the real run
 
 
-def write_odbc(folder, erp_path):
-    shutil.copy("/etc/odbcinst.ini", os.path.join(folder, "odbcinst.ini"))
-    with open(os.path.join(folder, "odbc.ini"), "w") as f:
-        f.write(f"[CheckErp]\nDriver=SQLite3\nDatabase={erp_path}\n")
 
 
-def write_settings(path, data, conn_type):
-    with open(path, "w") as f:
-        f.write("[Params]\nConnServer=CheckErp\nConnUID=\nConnPWD=\nConnDataBase=check\n"
-                f"ConnType={1 if conn_type == 2 else 0}\nConnPath={os.path.dirname(path)}\n"
-                f"[GeneralParams]\nDBPath={data}\n")
 
 
-def run_cli(cli, env, ini, verbs):
-    r = subprocess.run([cli, "--settings", ini] + verbs, env=env, capture_output=True, text=True, timeout=600)
-    return r
 
 
 def date_text(d):
@@ -470,7 +460,7 @@ def main():
 
     work = args.keep or tempfile.mkdtemp(prefix="docimport-check-")
     os.makedirs(work, exist_ok=True)
-    total = 0
+
     summary = []
     for conn_type in [int(x) for x in args.conn_types.split(",")]:
         rng = random.Random(args.seed + conn_type)
@@ -552,16 +542,8 @@ def main():
             for line in out:
                 print(line)
             summary.append((label, n))
-            total += n
-    print("\nSummary")
-    for label, n in summary:
-        print(f"  {'ok  ' if n == 0 else 'DIFF'} {label}" + (f" ({n})" if n else ""))
-    if not args.keep and total == 0:
-        shutil.rmtree(work, ignore_errors=True)
-        print(f"  {total} differences")
-    else:
-        print(f"  {total} differences; the files are in {work}")
-    return 0 if total == 0 else 1
+
+    return finish(summary, work, args.keep)
 
 
 if __name__ == "__main__":

@@ -24,6 +24,8 @@ import subprocess
 import sys
 import tempfile
 
+from checkrun import finish, run_cli, write_odbc, write_settings
+
 SEP = "\u05f0"  # the cell separator of the cell form of a text
 DEFAULT_LABEL = "/labels/default'%_.lbl"
 
@@ -173,22 +175,10 @@ def whole_var(caption):
 # ------------------------------------------------------------ the real run
 
 
-def write_odbc(folder, erp_path):
-    shutil.copy("/etc/odbcinst.ini", os.path.join(folder, "odbcinst.ini"))
-    with open(os.path.join(folder, "odbc.ini"), "w") as f:
-        f.write(f"[CheckErp]\nDriver=SQLite3\nDatabase={erp_path}\n")
 
 
-def write_settings(path, data, conn_type, journal):
-    with open(path, "w") as f:
-        f.write("[Params]\nConnServer=CheckErp\nConnUID=\nConnPWD=\nConnDataBase=check\n"
-                f"ConnType={1 if conn_type == 2 else 0}\nConnPath={os.path.dirname(path)}\n"
-                f"[GeneralParams]\nDBPath={data}\n[Automation]\nJournalFile={journal}\n")
 
 
-def run_cli(cli, env, ini, verbs, answer=None):
-    args = [cli, "--settings", ini] + (["--answer", answer] if answer else []) + verbs
-    return subprocess.run(args, env=env, capture_output=True, text=True, timeout=600)
 
 
 def journal_args(text):
@@ -449,7 +439,7 @@ def main():
 
     work = os.path.abspath(args.keep or tempfile.mkdtemp(prefix="plates-check-"))
     os.makedirs(work, exist_ok=True)
-    total, summary = 0, []
+    summary = []
     for conn_type in [int(x) for x in args.conn_types.split(",")]:
         rng = random.Random(args.seed + conn_type)
         base = os.path.join(work, f"type{conn_type}")
@@ -465,7 +455,7 @@ def main():
         write_odbc(base, erp_path)
         ini = os.path.join(base, "check.ini")
         journal = os.path.join(base, "journal.txt")
-        write_settings(ini, data, conn_type, journal)
+        write_settings(ini, data, conn_type, f"[Automation]\nJournalFile={journal}\n")
         env = dict(os.environ, QT_QPA_PLATFORM="offscreen", ODBCSYSINI=base, ODBCINI=os.path.join(base, "user-odbc.ini"))
         for name, check in (("label lists", lambda o: check_plates(args.cli, env, ini, data, journal, erp_path, conn_type, o)),
                             ("editors", lambda o: check_editors(args.cli, env, ini, data, o))):
@@ -479,16 +469,8 @@ def main():
             for line in out:
                 print(line)
             summary.append((f"type {conn_type}: {name}", n))
-            total += n
-    print("\nSummary")
-    for label, n in summary:
-        print(f"  {'ok  ' if n == 0 else 'DIFF'} {label}" + (f" ({n})" if n else ""))
-    if not args.keep and total == 0:
-        shutil.rmtree(work, ignore_errors=True)
-        print(f"  {total} differences")
-    else:
-        print(f"  {total} differences; the files are in {work}")
-    return 0 if total == 0 else 1
+
+    return finish(summary, work, args.keep)
 
 
 if __name__ == "__main__":

@@ -1,0 +1,39 @@
+"""What the acceptance checks share: the private ODBC data source, the
+settings file that points the headless host at it, running the host, and the
+closing summary."""
+import os
+import shutil
+import subprocess
+
+
+def write_odbc(folder, erp_path):
+    shutil.copy("/etc/odbcinst.ini", os.path.join(folder, "odbcinst.ini"))
+    with open(os.path.join(folder, "odbc.ini"), "w") as f:
+        f.write(f"[CheckErp]\nDriver=SQLite3\nDatabase={erp_path}\n")
+
+
+def write_settings(path, data, conn_type, extra=""):
+    with open(path, "w") as f:
+        f.write("[Params]\nConnServer=CheckErp\nConnUID=\nConnPWD=\nConnDataBase=check\n"
+                f"ConnType={1 if conn_type == 2 else 0}\nConnPath={os.path.dirname(path)}\n"
+                f"[GeneralParams]\nDBPath={data}\n{extra}")
+
+
+def run_cli(cli, env, ini, verbs, answer=None):
+    args = [cli, "--settings", ini] + (["--answer", answer] if answer else []) + verbs
+    return subprocess.run(args, env=env, capture_output=True, text=True, timeout=600)
+
+
+def finish(summary, work, keep):
+    """Prints the summary of (label, differences); the work folder goes only
+    when everything agreed and it was not asked to stay. The exit status."""
+    total = sum(n for _, n in summary)
+    print("\nSummary")
+    for label, n in summary:
+        print(f"  {'ok  ' if n == 0 else 'DIFF'} {label}" + (f" ({n})" if n else ""))
+    if not keep and total == 0:
+        shutil.rmtree(work, ignore_errors=True)
+        print(f"  {total} differences")
+    else:
+        print(f"  {total} differences; the files are in {work}")
+    return 0 if total == 0 else 1
