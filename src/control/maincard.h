@@ -10,6 +10,7 @@
 #include <QVariantMap>
 #include <QWidget>
 #include <memory>
+#include <optional>
 #include <vector>
 
 class QLabel;
@@ -215,6 +216,8 @@ private:
     // A reader's context that carries the current documents' item criteria.
     ErpReadContext docReadContext(const QString& conn);
     ErpReadContext plainContext(const QString& conn);
+    // The tab's default copies as a 16-bit number; none when the box holds no such number.
+    std::optional<short> defaultCopies() const;
     // The document import's settings as the tab holds them.
     DocImportOptions docImportOptions() const;
     int priceListNumber() const;

@@ -229,6 +229,15 @@ bool MainCard::cancelRequested()
     return m_work && m_work->cancelRequested();
 }
 
+std::optional<short> MainCard::defaultCopies() const
+{
+    bool ok = false;
+    const double value = ui->txtCopies->text().trimmed().toDouble(&ok);
+    if (!ok || value < -32768 || value > 32767)
+        return std::nullopt;
+    return short(std::nearbyint(value));
+}
+
 ErpReadContext MainCard::plainContext(const QString& conn)
 {
     ErpReadContext ctx;
@@ -339,9 +348,7 @@ void MainCard::ImportDocuments()
         return;
     const QString conn = currentConnString();
     const QString tempItems = dataFile(dbfiles::TempItems);
-    bool copiesOk = false;
-    const double copiesValue = ui->txtCopies->text().trimmed().toDouble(&copiesOk);
-    const short copies = copiesOk && copiesValue >= -32768 && copiesValue <= 32767 ? short(std::nearbyint(copiesValue)) : 0;
+    const short copies = defaultCopies().value_or(0);
     const short foreign = ui->CmbItemNameType->currentIndex() == 1 ? -1 : 0;
 
     // The items of each type's documents, read with that type's criteria; a
@@ -420,11 +427,10 @@ void MainCard::ImportItems()
     auto fail = [this](const QString& message) { m_services.prompt->critical(titles::Error, message); };
     const QString conn = currentConnString();
     const int priceList = priceListNumber();
-    bool copiesOk = false;
-    const double copiesValue = ui->txtCopies->text().trimmed().toDouble(&copiesOk);
-    if (!copiesOk || copiesValue < -32768 || copiesValue > 32767)
+    const std::optional<short> defaultCount = defaultCopies();
+    if (!defaultCount)
         return fail(QStringLiteral("ברירת המחדל לעותקים אינה מספר: '%1'").arg(ui->txtCopies->text()));
-    const short copies = short(std::nearbyint(copiesValue));
+    const short copies = *defaultCount;
 
     const QString folder = ui->txtDBPath->text();
     const QString itemsDb = dataFile(dbfiles::Items);
