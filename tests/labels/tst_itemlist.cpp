@@ -42,7 +42,6 @@ private slots:
         QTest::newRow("price as text") << QVariant("12.5") << "2" << "12.50";
         QTest::newRow("no price") << QVariant() << "2" << "";
         QTest::newRow("date as stored") << QVariant("2026-03-05 14:30:00") << "3" << "05/03/26";
-        QTest::newRow("date of a day") << QVariant(QDate(1999, 12, 31)) << "3" << "31/12/99";
         QTest::newRow("text that is no date") << QVariant("soon") << "3" << "soon";
         QTest::newRow("number as text") << QVariant(12) << "1" << "12";
         QTest::newRow("nothing") << QVariant() << "1" << "";
