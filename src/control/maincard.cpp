@@ -749,20 +749,9 @@ void MainCard::showDialog(const QString& formName)
         dialog = std::make_unique<FrmEditItems>(m_shared.dataFolder, m_shared.itemTextRtl, m_services.prompt, this);
     else if (formName == QLatin1String("frmLabDef")) {
         auto labDef = std::make_unique<FrmLabDef>(directLabelLayout(), fieldCaptions(), m_services.prompt, this);
-        // The preview's record: each field under the column the job reads, with a sample value of its kind.
-        QVector<PreviewField> fields;
-        for (int k = 0; const auto* desc = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(k)); ++k) {
-            const QString name = desc->property("Tag").toString();
-            const bool price = control<QLabel>(QStringLiteral("LblFldName(%1)").arg(k))->property("Tag").toString()
-                == QLatin1String("2");
-            QVariant value = QStringLiteral("1234567890");
-            if (price)
-                value = 12.5;
-            else if (name.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0)
-                value = QStringLiteral("פריט לדוגמה");
-            fields.push_back({name, price, value});
-        }
-        labDef->setPreviewSource([fields] { return fields; }, ui->txtPriceFormat->text());
+        // The selection does not change while the designer is open: its first record is read once.
+        QVector<PreviewField> fields = previewRecord();
+        labDef->setPreviewSource([fields = std::move(fields)] { return fields; }, ui->txtPriceFormat->text());
         dialog = std::move(labDef);
     }
     if (dialog)

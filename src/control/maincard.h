@@ -2,6 +2,7 @@
 
 #include "erp/odbc.h"
 #include "labels/itemquery.h"
+#include "labels/labelpreview.h"
 #include "platform/progress.h"
 #include "platform/services.h"
 
@@ -154,6 +155,10 @@ private:
     void SetGetLabelDefs(int action);
     // The captions of the label fields, LblFldDesc(0) on, in field index order.
     QStringList fieldCaptions() const;
+    // The record the designer's preview shows, fields by field index: the
+    // first label of the marked items, else of the marked document lines,
+    // else sample values of each field's kind.
+    QVector<PreviewField> previewRecord() const;
     // The one place that fills the lists whose entries come from the ERP.
     void FillErpLists();
     // Fills them again after a new connection, keeping or loading their positions.

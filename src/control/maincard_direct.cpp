@@ -5,6 +5,8 @@
 #include "labels/directlabels.h"
 #include "labels/directlayout.h"
 #include "labels/labelfields.h"
+#include "localdb/database.h"
+#include "localdb/schema.h"
 #include "platform/pageviewer.h"
 #include "platform/printercatalog.h"
 #include "platform/prompt.h"
@@ -14,6 +16,7 @@
 
 #include <QCheckBox>
 #include <QDir>
+#include <QFileInfo>
 #include <QLabel>
 
 namespace tagora {
@@ -151,6 +154,45 @@ bool MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath, bool by
     if (!lacking.isEmpty())
         m_services.prompt->message(PromptIcon::Exclamation, titles::Attention, lacking);
     return true;
+}
+
+QVector<PreviewField> MainCard::previewRecord() const
+{
+    QVector<PreviewField> fields;
+    for (int k = 0; k < LabelFieldCount; ++k) {
+        const QString name = control<QLabel>(QStringLiteral("LblFldDesc(%1)").arg(k))->property("Tag").toString();
+        const bool price
+            = control<QLabel>(QStringLiteral("LblFldName(%1)").arg(k))->property("Tag").toString() == QLatin1String("2");
+        QVariant sample = QStringLiteral("1234567890");
+        if (price)
+            sample = 12.5;
+        else if (name.compare(QLatin1String("VNItemName"), Qt::CaseInsensitive) == 0)
+            sample = QStringLiteral("פריט לדוגמה");
+        fields.push_back({name, price, sample});
+    }
+    // Every field is read, sent or not: a line may be set to a field the tab
+    // does not send yet, and the job will send it.
+    LabelQuerySettings settings = labelQuerySettings(false);
+    settings.sent.fill(true);
+    const QString tempDocs = dataFile(dbfiles::TempDocs);
+    // Only what is there is read: the preview never makes or repairs a file.
+    if (!QFileInfo::exists(tempDocs) || !CheckItemQuery(settings).isEmpty())
+        return fields;
+    Database db;
+    if (db.open(tempDocs, Database::OpenMode::ReadOnly))
+        return fields;
+    for (int queryType : {QueryByItems, QueryByDocuments}) {
+        DbError e;
+        Statement first = db.prepare(tagora::BuildItemQuery(settings, queryType, OrderAscending), &e);
+        if (e || first.step() != Statement::Step::Row)
+            continue;
+        for (PreviewField& f : fields) {
+            if (const int column = first.columnIndex(f.name); column >= 0)
+                f.value = first.value(column);
+        }
+        break;
+    }
+    return fields;
 }
 
 } // namespace tagora

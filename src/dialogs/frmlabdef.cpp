@@ -178,7 +178,8 @@ void FrmLabDef::refreshPreview()
     connect(m_browser, &QProcess::finished, this, [this, generation, png](int code, QProcess::ExitStatus status) {
         m_browser->deleteLater();
         m_browser = nullptr;
-        const bool ok = status == QProcess::NormalExit && code == 0 && QFile::exists(png);
+        const bool ok
+            = status == QProcess::NormalExit && code == 0 && QFile::exists(png) && TrimPreviewPicture(png);
         if (ok)
             m_previewPng = png;
         previewDone(generation, ok, ok ? QString() : QStringLiteral("אין תצוגה מקדימה: הדפדפן לא הצליח לצייר את המדבקה."));
@@ -190,13 +191,15 @@ void FrmLabDef::refreshPreview()
         m_browser = nullptr;
         previewDone(generation, false, QStringLiteral("אין תצוגה מקדימה: לא ניתן להפעיל את הדפדפן Chromium."));
     });
+    // The window is larger than any label a sheet of one holds, so nothing is
+    // cut off; the picture is trimmed to the label afterwards.
     m_browser->start(chromium, {QStringLiteral("--headless"), QStringLiteral("--no-sandbox"),
                                 QStringLiteral("--disable-gpu"), QStringLiteral("--no-first-run"),
                                 QStringLiteral("--disable-background-networking"),
                                 QStringLiteral("--disable-component-update"), QStringLiteral("--disable-sync"),
                                 QStringLiteral("--hide-scrollbars"),
                                 QStringLiteral("--user-data-dir=") + m_previewDir->filePath(QStringLiteral("profile")),
-                                QStringLiteral("--window-size=600,400"), QStringLiteral("--screenshot=") + png,
+                                QStringLiteral("--window-size=1200,1600"), QStringLiteral("--screenshot=") + png,
                                 QUrl::fromLocalFile(page).toString()});
 }
 

@@ -4,8 +4,11 @@
 #include "labels/directlabels.h"
 #include "localdb/database.h"
 
+#include <algorithm>
+
 #include <QDir>
 #include <QFile>
+#include <QImage>
 
 namespace tagora {
 
@@ -80,6 +83,41 @@ QString WritePreviewPage(const QString& folder, const DirectLabelLayout& layout,
     if (page)
         *page = file;
     return QString();
+}
+
+bool TrimPreviewPicture(const QString& path)
+{
+    QImage image(path);
+    if (image.isNull())
+        return false;
+    image = image.convertToFormat(QImage::Format_RGB32);
+    // Anti-aliased edges are near white; only what a reader would see counts.
+    auto inked = [](QRgb p) { return qRed(p) < 240 || qGreen(p) < 240 || qBlue(p) < 240; };
+    int left = image.width(), right = -1, top = image.height(), bottom = -1;
+    for (int y = 0; y < image.height(); ++y) {
+        const auto* line = reinterpret_cast<const QRgb*>(image.constScanLine(y));
+        for (int x = 0; x < image.width(); ++x) {
+            if (!inked(line[x]))
+                continue;
+            left = std::min(left, x);
+            right = std::max(right, x);
+            top = std::min(top, y);
+            bottom = std::max(bottom, y);
+        }
+    }
+    // A label with nothing in use is a blank picture; it stays as drawn.
+    if (right < 0)
+        return true;
+    // The quiet zone a barcode needs to be read lies in the margin.
+    const int margin = 16;
+    const QRect box = QRect(QPoint(left, top), QPoint(right, bottom))
+                          .adjusted(-margin, -margin, margin, margin)
+                          .intersected(image.rect());
+    const QString aside = path + QStringLiteral(".part");
+    if (!image.copy(box).save(aside, "PNG"))
+        return false;
+    QFile::remove(path);
+    return QFile::rename(aside, path);
 }
 
 } // namespace tagora

@@ -25,4 +25,10 @@ struct PreviewField {
 QString WritePreviewPage(const QString& folder, const DirectLabelLayout& layout, const QVector<PreviewField>& fields,
                          const QString& priceFormat, BarcodeLibrary& library, QString* page);
 
+// The browser draws the one label centred on a window larger than any label;
+// this cuts the picture at path down to what was drawn, with a small margin,
+// so the designer shows the label whole and nothing else. False when the
+// picture cannot be read or written.
+bool TrimPreviewPicture(const QString& path);
+
 } // namespace tagora

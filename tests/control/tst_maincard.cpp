@@ -1,7 +1,10 @@
 #include "support/cardfixture.h"
 #include "support/oldlayout.h"
 #include "support/dbrows.h"
+#include "support/labeldata.h"
 
+#include "dialogs/frmlabdef.h"
+#include "labels/directlayout.h"
 #include "labels/itemquery.h"
 #include "localdb/schema.h"
 #include "platform/clicklabel.h"
@@ -13,7 +16,9 @@
 #include <QLabel>
 #include <QLineEdit>
 #include <QPushButton>
+#include <QProcess>
 #include <QRadioButton>
+#include <QSignalSpy>
 #include <QTabWidget>
 #include <QtTest>
 
@@ -172,6 +177,54 @@ private slots:
         f.c<QPushButton>(button)->click();
         QCOMPARE(f.dialogs->opened, QStringList{form});
         QCOMPARE(shown, rows);
+    }
+
+    // The designer's preview shows the first marked item as the job would
+    // print it; with no data folder yet, a sample of the field's kind.
+    void designerPreviewRecord_data()
+    {
+        QTest::addColumn<bool>("withData");
+        QTest::addColumn<QString>("decoded");
+        QTest::newRow("first marked item") << true << "CODE-128:7290000000015";
+        QTest::newRow("no data folder") << false << "CODE-128:1234567890";
+    }
+    void designerPreviewRecord()
+    {
+        QFETCH(bool, withData);
+        QFETCH(QString, decoded);
+        const QString zbarimg = QStandardPaths::findExecutable("zbarimg");
+        if (QStandardPaths::findExecutable("chromium").isEmpty() || zbarimg.isEmpty())
+            QSKIP("chromium or zbarimg is not installed");
+        LabelData data;
+        CardFixture f;
+        f.c<QLineEdit>("txtDBPath")->setText(withData ? data.folder : f.dir.filePath("none"));
+        DirectLabelLayout& layout = directLabelLayout();
+        const DirectLabelLayout before = layout;
+        layout = DirectLabelLayout();
+        layout.lines[0].UseCell = true;
+        layout.lines[0].FldID = 4; // the barcode field, not sent on this tab
+        layout.lines[0].ViewType = 1;
+        layout.bar.BarType = 2;
+        layout.bar.DimX = 0.01f;
+        layout.bar.BarHeight = 0.3f;
+        layout.bar.UserResoX = 0;
+        layout.bar.UserResoY = 0;
+        // The dialog's pictures go with it; the test keeps a copy.
+        const QString picture = f.dir.filePath("preview.png");
+        f.dialogs->drive = [&](QDialog& d) {
+            auto& designer = static_cast<FrmLabDef&>(d);
+            QSignalSpy done(&designer, &FrmLabDef::previewFinished);
+            designer.refreshPreview();
+            if (done.wait(120000) && done.last().at(0).toBool())
+                QFile::copy(designer.previewPicture(), picture);
+        };
+        f.c<QPushButton>("cmdLabDesign")->click();
+        layout = before;
+        QVERIFY(QFile::exists(picture));
+        QProcess reader;
+        reader.start(zbarimg, {"-q", picture});
+        QVERIFY(reader.waitForFinished(60000));
+        QCOMPARE(QString::fromUtf8(reader.readAllStandardOutput()).trimmed(), decoded);
     }
 
     // The picture beside a step clicks that step's button.
