@@ -6,6 +6,7 @@
 //   --demo DIR (with --demo-items N, --demo-type 1|2 before it).
 // A dialog that a command opens takes the verbs that follow until one of them
 // closes it; verbs name the dialog's controls first, then the control's.
+#include "cards/tagorainfo.h"
 #include "control/maincard.h"
 #include "control/settingstable.h"
 #include "erp/demosetup.h"
@@ -31,7 +32,8 @@ namespace {
 
 using namespace tagora;
 
-const QStringList kVerbs = {"set", "get", "click", "dblclick", "call", "additem", "grab", "setcell", "getcell"};
+const QStringList kVerbs = {"set",   "get",     "click", "dblclick", "call",   "call-info",
+                            "additem", "grab", "setcell", "getcell"};
 
 void out(const QString& text)
 {
@@ -121,6 +123,12 @@ public:
         out(QStringLiteral("page: ") + QDir::toNativeSeparators(path));
         return true;
     }
+    // The window would move on to the page: its path is printed the same way.
+    bool navigate(const QString&, const QString& to, QString*) override
+    {
+        out(QStringLiteral("page: ") + QDir::toNativeSeparators(to));
+        return true;
+    }
 };
 
 class Interpreter : public DialogRunner {
@@ -164,7 +172,7 @@ private:
             err(why);
         err(QStringLiteral("usage: tagora-cli [--settings FILE] [--answer yes|no] [--file PATH] [--script FILE|-] "
                            "[--demo-items N] [--demo-type 1|2] [--demo DIR] [set NAME VALUE | get NAME | click NAME | "
-                           "dblclick NAME | call METHOD [ARG...] | additem NAME TEXT | grab FILE | "
+                           "dblclick NAME | call METHOD [ARG...] | call-info METHOD [ARG...] | additem NAME TEXT | grab FILE | "
                            "setcell GRID ROW COL VALUE | getcell GRID ROW COL]..."));
         m_failed = true;
     }
@@ -192,7 +200,7 @@ private:
         services.prompt = m_prompt;
         services.fileDialog = m_files;
         services.printDialog = std::make_shared<ScriptedPrintDialog>(m_files.get());
-        services.pages = std::make_shared<PrintedPages>();
+        services.pages = m_pages;
         // The card lives as long as this interpreter, which outlives every use of it.
         services.dialogs = std::shared_ptr<DialogRunner>(this, [](DialogRunner*) {});
         m_card = std::make_unique<MainCard>(nullptr, services);
@@ -358,11 +366,15 @@ private:
                 : QMetaObject::invokeMethod(c, "doubleClicked", Qt::DirectConnection);
             if (!ok)
                 return fail(QStringLiteral("%1 cannot be clicked").arg(name));
-        } else if (t == QLatin1String("call")) {
+        } else if (t == QLatin1String("call") || t == QLatin1String("call-info")) {
             if (!has(1))
                 return usage();
             const QString method = take();
-            const auto arity = methodArity(m_card.get(), method);
+            // call-info speaks to the public local item card class, as a host that created one would.
+            if (t == QLatin1String("call-info") && !m_info)
+                m_info = std::make_unique<TagoraInfo>(m_pages, m_prompt);
+            QObject* target = t == QLatin1String("call") ? static_cast<QObject*>(m_card.get()) : m_info.get();
+            const auto arity = methodArity(target, method);
             if (!arity)
                 return fail(QStringLiteral("no public method named '%1'").arg(method));
             QStringList args;
@@ -371,7 +383,7 @@ private:
                    && (args.size() < arity->first
                        || (!kVerbs.contains(m_tokens[m_pos]) && !m_tokens[m_pos].startsWith(QLatin1String("--")))))
                 args << take();
-            const CallResult r = callMethod(m_card.get(), method, args);
+            const CallResult r = callMethod(target, method, args);
             if (!r.ok)
                 return fail(r.error);
             if (r.hasValue)
@@ -432,7 +444,9 @@ private:
     std::shared_ptr<ScriptedFileDialog> m_files = std::make_shared<ScriptedFileDialog>();
     std::shared_ptr<SettingsStore> m_store;
     DemoOptions m_demo;
+    std::shared_ptr<PrintedPages> m_pages = std::make_shared<PrintedPages>();
     std::unique_ptr<MainCard> m_card;
+    std::unique_ptr<TagoraInfo> m_info;
     std::vector<QWidget*> m_scopes;
 };
 

@@ -1,6 +1,11 @@
 // The item list: what a print run would produce, as a page in the browser.
 #include "control/maincard.h"
 
+#include "cards/priorityinfo.h"
+#include "cards/tagorainfo.h"
+#include "erp/connparams.h"
+#include "localdb/schema.h"
+
 #include "labels/directlabels.h"
 #include "labels/itemlist.h"
 #include "platform/pageviewer.h"
@@ -56,6 +61,17 @@ void MainCard::ShowItemList(uchar queryType, const QString& dbPath)
     m_services.prompt->critical(titles::Fault, error);
 }
 
-void MainCard::showItemCard(const QString&, bool) {}
+// The card of an item row's picture: from the ERP over the stored connection,
+// or from the local databases of the data folder, without an account.
+void MainCard::showItemCard(const QString& itemKey, bool fromErp)
+{
+    if (fromErp) {
+        const ConnParams& c = connParams();
+        PriorityInfo(m_services.pages, m_services.prompt)
+            .OpenItemHTML(itemKey, BuildConnString(c.server, c.uid, c.pwd, c.database, c.type), c.type, c.path);
+        return;
+    }
+    TagoraInfo(m_services.pages, m_services.prompt).OpenItemHTML(itemKey, dataFile(dbfiles::TempDocs), QString());
+}
 
 } // namespace tagora

@@ -183,13 +183,13 @@ QString cellPercent(int count)
     return t;
 }
 
-QString directJobFolder()
+QString UserTempFolder()
 {
     QString temp = qEnvironmentVariable("Temp");
 #ifdef Q_OS_UNIX
     // The system's temporary folder is shared by every user here: a name
     // planted in it could turn our clean-up against someone else's files, or
-    // swap the page before the browser reads it. A folder of the user's own
+    // swap a page before the browser reads it. A folder of the user's own
     // serves instead.
     if (temp.isEmpty()) {
         temp = qEnvironmentVariable("XDG_RUNTIME_DIR");
@@ -201,7 +201,12 @@ QString directJobFolder()
     if (temp.isEmpty())
         temp = QDir::tempPath();
 #endif
-    return QDir(temp).filePath(QStringLiteral("tgrlab"));
+    return temp;
+}
+
+QString directJobFolder()
+{
+    return QDir(UserTempFolder()).filePath(QStringLiteral("tgrlab"));
 }
 
 namespace {

@@ -12,10 +12,12 @@ namespace tagora {
 class ProgressSink;
 class BarcodeLibrary;
 
-// The folder of a direct-label job: "Temp" followed by "tgrlab" when that
-// variable is set; otherwise "tgrlab" in a folder of the user's own
-// ($XDG_RUNTIME_DIR, else the user's cache folder; the temporary folder on
-// Windows, which is the user's own there).
+// The folder the pages we show are written in: "Temp" when that variable is
+// set; otherwise a folder of the user's own ($XDG_RUNTIME_DIR, else the
+// user's cache folder; the temporary folder on Windows, which is the user's
+// own there).
+QString UserTempFolder();
+// The folder of a direct-label job: "tgrlab" in UserTempFolder().
 QString directJobFolder();
 // Makes the job folder (mode 0700) or takes it as it stands: a link, a folder
 // of another user or one others may write to is refused with the reason.

@@ -3,8 +3,10 @@
 #include "platform/settingsstore.h"
 
 #include <QDesktopServices>
+#include <QDir>
 #include <QFileInfo>
 #include <QProcess>
+#include <QSaveFile>
 #include <QUrl>
 
 namespace tagora {
@@ -42,6 +44,32 @@ bool DesktopPageViewer::showPage(const QString& path, QString* error)
         return false;
     }
     return true;
+}
+
+bool PageViewer::navigate(const QString& from, const QString& to, QString* error)
+{
+    // Written aside and renamed over the waiting page, so its next reload
+    // reads either the waiting page or the whole redirect, never a part.
+    const QString target = QUrl::fromLocalFile(QFileInfo(to).absoluteFilePath()).toString(QUrl::FullyEncoded);
+    QSaveFile page(from);
+    if (page.open(QIODevice::WriteOnly)) {
+        page.write(QByteArrayLiteral("<HTML>\r\n<HEAD>\r\n<meta http-equiv='refresh' content='0;url=")
+                   + target.toLatin1().replace('\'', "%27")
+                   + QByteArrayLiteral("'>\r\n</HEAD>\r\n<BODY>\r\n</BODY>\r\n</HTML>\r\n"));
+        if (page.commit())
+            return true;
+    }
+    *error = QStringLiteral("לא ניתן להעביר את חלון הדפדפן לדף %1").arg(QDir::toNativeSeparators(to));
+    return false;
+}
+
+bool ShowPageAfterWaitPage(PageViewer& pages, const QString& waitPage, const std::function<QString()>& writePage,
+                           QString* error)
+{
+    if (!pages.showPage(waitPage, error))
+        return false;
+    const QString page = writePage();
+    return page.isEmpty() || pages.navigate(waitPage, page, error);
 }
 
 } // namespace tagora

@@ -25,6 +25,12 @@ struct RecordingViewer : tagora::PageViewer {
         shown << path;
         return true;
     }
+    // A window moved on to another page shows that page too.
+    bool navigate(const QString&, const QString& to, QString*) override
+    {
+        shown << to;
+        return true;
+    }
 };
 
 // Dialogs opened by a command in a test: each is recorded and handed to the
