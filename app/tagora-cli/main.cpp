@@ -33,7 +33,7 @@ namespace {
 using namespace tagora;
 
 const QStringList kVerbs = {"set",   "get",     "click", "dblclick", "call",   "call-info",
-                            "additem", "grab", "setcell", "getcell"};
+                            "additem", "grab", "setcell", "getcell", "clickcell"};
 
 void out(const QString& text)
 {
@@ -173,7 +173,7 @@ private:
         err(QStringLiteral("usage: tagora-cli [--settings FILE] [--answer yes|no] [--file PATH] [--script FILE|-] "
                            "[--demo-items N] [--demo-type 1|2] [--demo DIR] [set NAME VALUE | get NAME | click NAME | "
                            "dblclick NAME | call METHOD [ARG...] | call-info METHOD [ARG...] | additem NAME TEXT | grab FILE | "
-                           "setcell GRID ROW COL VALUE | getcell GRID ROW COL]..."));
+                           "setcell GRID ROW COL VALUE | getcell GRID ROW COL | clickcell GRID ROW COL]..."));
         m_failed = true;
     }
 
@@ -397,6 +397,19 @@ private:
             if (!combo)
                 return fail(QStringLiteral("%1 is not a list").arg(name));
             combo->addItem(text);
+        } else if (t == QLatin1String("clickcell")) {
+            if (!has(3))
+                return usage();
+            const QString name = take();
+            const int row = take().toInt();
+            const int col = take().toInt();
+            auto* view = qobject_cast<QAbstractItemView*>(find(name));
+            const QModelIndex index = view && view->model() ? view->model()->index(row - 1, col) : QModelIndex();
+            if (!index.isValid())
+                return fail(QStringLiteral("%1 has no cell %2, %3").arg(name).arg(row).arg(col));
+            // As a user's click: the row becomes current, then the grid hears the click.
+            view->setCurrentIndex(index);
+            emit view->clicked(index);
         } else if (t == QLatin1String("setcell") || t == QLatin1String("getcell")) {
             // Grid rows count as the grid shows them: row 0 is the header, data from 1.
             const bool write = t == QLatin1String("setcell");
