@@ -1,9 +1,50 @@
-"""What the acceptance checks share: the private ODBC data source, the
-settings file that points the headless host at it, running the host, and the
-closing summary."""
+"""What the acceptance checks share: the ERP's text in reading order, the
+private ODBC data source, the settings file that points the headless host at
+it, running the host, and the closing summary."""
 import os
 import shutil
 import subprocess
+
+
+def is_hebrew(c):
+    return "\u05d0" <= c <= "\u05ea"
+
+
+def visual_to_logical(text, conn_type):
+    """ERP text kept in display order, turned into reading order (types 0, 1)."""
+    if conn_type not in (0, 1):
+        return text
+    mirror = {"(": ")", ")": "(", "[": "]", "]": "[", "{": "}", "}": "{"}
+    result, run = "", ""
+    for c in text:
+        m = mirror.get(c, c)
+        if c.isascii() and c.isalnum():
+            run += m
+        elif c in "+-./\\":
+            if run:
+                run += m
+            else:
+                result = m + result
+        else:
+            if run:
+                result = run + result
+                run = ""
+            result = m + result
+    if run:
+        result = run + result
+    return result
+
+
+def erp_text(value, default, conn_type):
+    if value is None or str(value) == "":
+        return default
+    text = str(value)
+    if conn_type in (0, 1) and any(is_hebrew(c) for c in text):
+        return visual_to_logical(text, conn_type)
+    return text
+
+
+# ------------------------------------------------------------------ the ERP
 
 
 def write_odbc(folder, erp_path):

@@ -24,41 +24,12 @@ import subprocess
 import sys
 import tempfile
 
-from checkrun import finish, run_cli, write_odbc, write_settings
+from checkrun import erp_text, finish, is_hebrew, run_cli, visual_to_logical, write_odbc, write_settings
 
 SEP = "\u05f0"  # the cell separator of the cell form of a text
 DEFAULT_LABEL = "/labels/default'%_.lbl"
 
 # ------------------------------------------------------------- conversions
-
-
-def is_hebrew(c):
-    return "\u05d0" <= c <= "\u05ea"
-
-
-def visual_to_logical(text, conn_type):
-    """ERP text kept in display order, turned into reading order (types 0, 1)."""
-    if conn_type not in (0, 1):
-        return text
-    mirror = {"(": ")", ")": "(", "[": "]", "]": "[", "{": "}", "}": "{"}
-    result, run = "", ""
-    for c in text:
-        m = mirror.get(c, c)
-        if c.isascii() and c.isalnum():
-            run += m
-        elif c in "+-./\\":
-            if run:
-                run += m
-            else:
-                result = m + result
-        else:
-            if run:
-                result = run + result
-                run = ""
-            result = m + result
-    if run:
-        result = run + result
-    return result
 
 
 def label_text(value, conn_type):
@@ -69,18 +40,6 @@ def label_text(value, conn_type):
         return text
     mirror = {"(": ")", ")": "(", "<": ">", ">": "<", "[": "]", "]": "[", "{": "}", "}": "{"}
     return "".join(SEP + mirror.get(c, c) for c in reversed(text)) + SEP
-
-
-def erp_text(value, default, conn_type):
-    if value is None or str(value) == "":
-        return default
-    text = str(value)
-    if conn_type in (0, 1) and any(is_hebrew(c) for c in text):
-        return visual_to_logical(text, conn_type)
-    return text
-
-
-# ------------------------------------------------------------------ the ERP
 
 
 def make_erp(path, rng, own_label, folder_label):
