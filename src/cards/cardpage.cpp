@@ -116,6 +116,12 @@ void CardPage::captionTable(const QStringList& captions, const QStringList& cell
 
 void CardPage::listSection(const QString& caption, const QStringList& columns, const QVector<QStringList>& rows)
 {
+    listSection(caption, columns, rows, {});
+}
+
+void CardPage::listSection(const QString& caption, const QStringList& columns, const QVector<QStringList>& rows,
+                           const QStringList& cellAttributes)
+{
     if (rows.isEmpty())
         return;
     m_out.line(QStringLiteral(" <tr><td colspan=2 class=GCap>") + HtmlText(caption) + QStringLiteral("</td></tr>"));
@@ -127,8 +133,11 @@ void CardPage::listSection(const QString& caption, const QStringList& columns, c
     m_out.line(QStringLiteral("    </tr>"));
     for (const QStringList& row : rows) {
         m_out.line(QStringLiteral("    <tr>"));
-        for (const QString& cell : row)
-            m_out.line(QStringLiteral("     <td>") + cell + QStringLiteral("</td>"));
+        for (int i = 0; i < row.size(); ++i) {
+            const QString attributes = cellAttributes.value(i);
+            m_out.line((attributes.isEmpty() ? QStringLiteral("     <td>") : QStringLiteral("     <td %1>").arg(attributes))
+                       + row[i] + QStringLiteral("</td>"));
+        }
         m_out.line(QStringLiteral("    </tr>"));
     }
     m_out.line(QStringLiteral("   </table>"));

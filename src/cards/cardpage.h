@@ -51,6 +51,11 @@ public:
     // captions in class Cap and a row per entry. Nothing at all is written
     // for a section without rows.
     void listSection(const QString& caption, const QStringList& columns, const QVector<QStringList>& rows);
+    // The same, with the markup each column's cells carry in their tag
+    // (e.g. "dir=ltr" for a column of Latin text); an empty entry or a
+    // missing one leaves the cell plain.
+    void listSection(const QString& caption, const QStringList& columns, const QVector<QStringList>& rows,
+                     const QStringList& cellAttributes);
     // Markup of the card's own layout, as it stands.
     void line(const QString& text) { m_out.line(text); }
 

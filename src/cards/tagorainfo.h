@@ -37,7 +37,8 @@ public:
     Q_INVOKABLE QStringList CreateHTMLStyle() const;
 
 private:
-    // The card's text, or why it could not be made.
+    // Empty text when the whole card is at fileName, else why it could not
+    // be made (and no card is left there).
     QString writeCard(const QString& fileName, const QString& itemCode, const QString& dbName,
                       const QString& accountKey);
 

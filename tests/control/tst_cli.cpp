@@ -573,6 +573,41 @@ private slots:
         QVERIFY(readAll(journal).contains("LabelSetVar(2, \"ItemKey\", \"K1\""));
     }
 
+    // The local item card, from a host's call and from a click in the item
+    // selection's card column: the waiting page, then the card in its window.
+    void localItemCard_data()
+    {
+        QTest::addColumn<QStringList>("script");
+        QTest::newRow("call-info") << QStringList{"call-info", "OpenItemHTML", "it'S-1", "%docs"};
+        QTest::newRow("card column") << QStringList{"set",       "txtDBPath",     "%data", "click", "cmdSelectItems",
+                                                    "set",       "OptItmCard(1)", "True",  "clickcell",
+                                                    "VSSelectItems", "1",         "0",     "click", "cmdClose"};
+    }
+    void localItemCard()
+    {
+        QFETCH(QStringList, script);
+        const QString data = dir.filePath("localcard");
+        if (!QFile::exists(data + "/" + dbfiles::TempDocs)) {
+            QVERIFY(!PrepareDataFolder(data));
+            DbError e;
+            QVERIFY(!CreateTempDocsDB(data + "/" + dbfiles::Config, data + "/" + dbfiles::Items,
+                                      data + "/" + dbfiles::TempDocs, &e).isEmpty());
+            QVERIFY(!execOn(data + "/" + dbfiles::Items,
+                            "DELETE FROM tItems; INSERT INTO tItems (ItemKey, ItemName, Copies, PrintLabel)"
+                            " VALUES ('IT''S-1', 'Card <item>', 1, 1)"));
+        }
+        script.replaceInStrings("%docs", data + "/" + dbfiles::TempDocs);
+        script.replaceInStrings("%data", data);
+        const QString temp = QFileInfo(settings()).absolutePath() + "/temp/";
+        QFile::remove(temp + "vnicrd2.htm");
+        const Run r = runCli(settings(), script);
+        QVERIFY2(r.exitCode == 0, qPrintable((r.out + r.err).join('\n')));
+        QCOMPARE(r.out.filter(QRegularExpression("^page: ")),
+                 QStringList({"page: " + temp + "vnicrd0.htm", "page: " + temp + "vnicrd2.htm"}));
+        const QString card = QStringDecoder("windows-1255").decode(readAll(temp + "vnicrd2.htm"));
+        QVERIFY2(card.contains("<b>IT&#39;S-1</b>") && card.contains("Card &lt;item&gt;"), qPrintable(card));
+    }
+
     // A method with an optional last parameter stops taking arguments at the next verb.
     void optionalArgumentsStopAtVerb()
     {

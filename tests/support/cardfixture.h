@@ -8,6 +8,7 @@
 #include "platform/printercatalog.h"
 #include "platform/prompt.h"
 #include "platform/settingsstore.h"
+#include "support/recordingviewer.h"
 
 #include <QComboBox>
 #include <QDialog>
@@ -16,22 +17,6 @@
 #include <QStandardPaths>
 #include <QTemporaryDir>
 #include <memory>
-
-// Pages the control would open in a browser, noted instead.
-struct RecordingViewer : tagora::PageViewer {
-    QStringList shown;
-    bool showPage(const QString& path, QString*) override
-    {
-        shown << path;
-        return true;
-    }
-    // A window moved on to another page shows that page too.
-    bool navigate(const QString&, const QString& to, QString*) override
-    {
-        shown << to;
-        return true;
-    }
-};
 
 // Dialogs opened by a command in a test: each is recorded and handed to the
 // test's callback (if any), then closed, so nothing waits for a user.
