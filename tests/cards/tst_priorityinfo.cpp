@@ -142,7 +142,6 @@ private slots:
         addCompany(u"Erp1"_s, 1);
         addCompany(u"Erp2"_s, 2);
         addCompany(u"NoLang"_s, 2, u"PARTTEXTLANG"_s);
-        addCompany(u"NoTree"_s, 2, u"PARTARC"_s);
         m_odbc.addDsn(u"GoneFile"_s, {{u"Driver"_s, u"SQLite3"_s}, {u"Database"_s, m_dir.filePath(u"none.sqlite"_s)}});
     }
 
@@ -162,8 +161,7 @@ private slots:
             for (const QString& code : {kScrew, u"AB\"12"_s, u"פריט-א"_s, u"<X>&1"_s, kLongCode})
                 row(dsn, code.left(12), code, {u"<b>"_s + HtmlText(code) + u"</b>"_s}, {ended});
             // A code the ERP does not hold gives the card that ends after its title row.
-            for (const QString& code : {u"NO'SUCH"_s, u"O'R"_s})
-                row(dsn, code, code, {ended}, {u"<b>"_s});
+            row(dsn, u"unknown"_s, u"O'R"_s, {ended}, {u"<b>"_s});
             row(dsn, u"empty parameters left out"_s, kDrill, {u"<td class=GCap>פרמטר 4:</td><td>Li-Ion</td>"_s},
                 {u"מידה:"_s, u"חומר:"_s});
             row(dsn, u"described parameter"_s, kScrew, {u"<td class=GCap>צבע:</td><td>כסוף</td>"_s}, {u"פרמטר 4"_s});
@@ -178,9 +176,7 @@ private slots:
              u"K&lt;1&amp;2&gt;"_s},
             {u"<i>"_s, u"<script>"_s, u"K<1"_s});
         row(u"NoLang"_s, u"without the English texts' table"_s, kScrew,
-            {u"תאור בעברית:"_s, u"עצי מוצר"_s, u"מחירונים"_s}, {u"תאור באנגלית:"_s, u"Hex head screw"_s});
-        row(u"NoTree"_s, u"without the product trees' table"_s, kScrew, {u"תאור באנגלית:"_s, u"פריטים חלופיים"_s},
-            {u"עצי מוצר"_s});
+            {u"תאור בעברית:"_s, u"מחירונים"_s, u"TREE-NOW"_s}, {u"תאור באנגלית:"_s, u"Hex head screw"_s});
     }
     void card()
     {
