@@ -3,10 +3,13 @@
 #include <QDate>
 #include <QString>
 #include <QStringList>
+#include <QVariantList>
 #include <memory>
 
 namespace tagora {
 
+class CardPage;
+class ErpConnection;
 class PageViewer;
 class Prompt;
 
@@ -37,6 +40,13 @@ public:
     void setTimeout(int seconds) { m_timeout = seconds; }
 
 private:
+    // The sections of a found item (its row of the item query).
+    void writeItem(CardPage& page, ErpConnection& erp, const QVariantList& item, const QString& connPath);
+    void writeParameters(CardPage& page, ErpConnection& erp, const QVariantList& byId);
+    // Where the browser finds the item's picture: a name from the ERP's
+    // folder ("..") put under the company folder connPath, any other as it is.
+    static QString pictureSource(const QString& name, const QString& connPath);
+
     std::shared_ptr<PageViewer> m_pages;
     std::shared_ptr<Prompt> m_prompt;
     QDate m_today;

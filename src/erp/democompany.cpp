@@ -1182,7 +1182,7 @@ private:
         };
         const Id screw{2}, drill{6}, g0{7}, g1{8}, g2{9}, g3{10};
 
-        files.add({screw.id, -1, u8("..\\system\\mail\\pics\\OR-5.jpg"), u8("תמונה")});
+        files.add({screw.id, -1, kDemoPictureName, u8("תמונה")});
         files.add({screw.id, 1, u8("..\\system\\mail\\docs\\OR-5.pdf"), u8("מפרט טכני")});
         files.add({drill.id, -1, u8("c:\\pics\\makita-482.png"), u8("Picture")});
         files.add({g0.id, -1, u8(""), u8("")});

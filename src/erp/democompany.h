@@ -27,6 +27,10 @@ struct DemoOptions {
     bool labelLists = true;
 };
 
+// The picture the demo ERP names for one of its items, as the ERP writes it:
+// from the ERP's folder, with its own separators.
+inline const QString kDemoPictureName = QStringLiteral("..\\system\\mail\\pics\\OR-5.jpg");
+
 // Creates the demo ERP as an SQLite file at path, replacing any file there.
 // Rows are inserted as they are made, in one transaction, so memory stays the
 // same whatever the number of items; on an error the file is removed.

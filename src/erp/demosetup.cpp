@@ -4,8 +4,12 @@
 #include "localdb/database.h"
 #include "platform/settingsstore.h"
 
+#include <QBuffer>
 #include <QDir>
 #include <QFileInfo>
+#include <QImage>
+#include <QPainter>
+#include <QSaveFile>
 
 #include <vector>
 
@@ -15,7 +19,46 @@ namespace tagora {
 
 namespace {
 const char* kSqliteDriver = "SQLite3";
+
+// The demo item's picture where the ERP's name for it leads from the ERP's
+// folder, so the item card has a picture to show: a hexagon-headed screw,
+// drawn without text (no fonts needed without a screen). Empty text on success.
+QString writeDemoPicture(const QString& erpFolder)
+{
+    const QString path =
+        QDir::cleanPath(QDir(erpFolder).filePath(QString(kDemoPictureName).replace(QLatin1Char('\\'), QLatin1Char('/'))));
+    const QString failed = QStringLiteral("לא ניתן לכתוב את התמונה '%1'").arg(QDir::toNativeSeparators(path));
+    if (!QDir().mkpath(QFileInfo(path).absolutePath()))
+        return failed;
+    QImage image(160, 120, QImage::Format_RGB32);
+    image.fill(QColor(0xF4, 0xF8, 0xFB));
+    {
+        QPainter p(&image);
+        p.setRenderHint(QPainter::Antialiasing);
+        p.setPen(QPen(QColor(0x40, 0x48, 0x50), 2));
+        p.setBrush(QColor(0xB8, 0xC0, 0xC8));
+        const QPolygonF head{{20, 60}, {32, 38}, {56, 38}, {68, 60}, {56, 82}, {32, 82}};
+        p.drawPolygon(head);
+        p.drawRect(QRectF(68, 50, 74, 20));
+        for (int x = 76; x < 142; x += 8)
+            p.drawLine(QPointF(x, 50), QPointF(x + 5, 70));
+    }
+    // Without the JPEG plugin the picture goes as PNG under the same name:
+    // browsers go by the content, not by the name.
+    QByteArray bytes;
+    for (const char* format : {"JPG", "PNG"}) {
+        bytes.clear();
+        QBuffer buffer(&bytes);
+        if (buffer.open(QIODevice::WriteOnly) && image.save(&buffer, format, 90))
+            break;
+        bytes.clear();
+    }
+    QSaveFile out(path);
+    if (bytes.isEmpty() || !out.open(QIODevice::WriteOnly) || out.write(bytes) != bytes.size())
+        return failed;
+    return out.commit() ? QString() : failed;
 }
+} // namespace
 
 QString RegisterSqliteDsn(const QString& dsn, const QString& databasePath)
 {
@@ -45,6 +88,8 @@ QString SetupDemoCompany(const QString& folder, const DemoOptions& options, Sett
     if (const DbError e = CreateDemoErp(erpFile, options))
         return e.message;
     if (const QString e = RegisterSqliteDsn(kDemoDsn, erpFile); !e.isEmpty())
+        return e;
+    if (const QString e = writeDemoPicture(QFileInfo(erpFile).absolutePath()); !e.isEmpty())
         return e;
 
     const std::pair<const char*, QString> params[] = {
