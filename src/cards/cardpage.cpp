@@ -11,6 +11,11 @@ namespace {
 const QString kMeta = QStringLiteral("<meta http-equiv='Content-Type' content='text/html; charset=windows-1255'>");
 const QString kCompany = QStringLiteral("ונמר מערכות מידע");
 
+QString cellTag(const QString& attributes)
+{
+    return attributes.isEmpty() ? QStringLiteral("     <td>") : QStringLiteral("     <td %1>").arg(attributes);
+}
+
 QString cantWrite(const QString& path)
 {
     return QStringLiteral("לא ניתן לכתוב את הקובץ %1").arg(QDir::toNativeSeparators(path));
@@ -100,7 +105,7 @@ bool CardPage::begin(const QStringList& styleLines, const QString& titleRow)
     return true;
 }
 
-void CardPage::captionTable(const QStringList& captions, const QStringList& cells)
+void CardPage::captionTable(const QStringList& captions, const QStringList& cells, const QStringList& cellAttributes)
 {
     m_out.line(QStringLiteral("   <table width='100%'>"));
     m_out.line(QStringLiteral("    <tr>"));
@@ -108,8 +113,8 @@ void CardPage::captionTable(const QStringList& captions, const QStringList& cell
         m_out.line(QStringLiteral("     <td class=Cap>") + HtmlText(c) + QStringLiteral("</td>"));
     m_out.line(QStringLiteral("    </tr>"));
     m_out.line(QStringLiteral("    <tr>"));
-    for (const QString& c : cells)
-        m_out.line(QStringLiteral("     <td>") + c + QStringLiteral("</td>"));
+    for (qsizetype i = 0; i < cells.size(); ++i)
+        m_out.line(cellTag(cellAttributes.value(i)) + cells[i] + QStringLiteral("</td>"));
     m_out.line(QStringLiteral("    </tr>"));
     m_out.line(QStringLiteral("   </table>"));
 }
@@ -134,9 +139,7 @@ void CardPage::listSection(const QString& caption, const QStringList& columns, c
     for (const QStringList& row : rows) {
         m_out.line(QStringLiteral("    <tr>"));
         for (int i = 0; i < row.size(); ++i) {
-            const QString attributes = cellAttributes.value(i);
-            m_out.line((attributes.isEmpty() ? QStringLiteral("     <td>") : QStringLiteral("     <td %1>").arg(attributes))
-                       + row[i] + QStringLiteral("</td>"));
+            m_out.line(cellTag(cellAttributes.value(i)) + row[i] + QStringLiteral("</td>"));
         }
         m_out.line(QStringLiteral("    </tr>"));
     }

@@ -46,7 +46,8 @@ public:
     bool begin(const QStringList& styleLines, const QString& titleRow);
 
     // A table with the column captions in class Cap over one row of cells.
-    void captionTable(const QStringList& captions, const QStringList& cells);
+    // cellAttributes as for listSection.
+    void captionTable(const QStringList& captions, const QStringList& cells, const QStringList& cellAttributes = {});
     // A section: its caption in class GCap, then a table with the column
     // captions in class Cap and a row per entry. Nothing at all is written
     // for a section without rows.

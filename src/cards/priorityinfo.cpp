@@ -55,26 +55,6 @@ QVector<QStringList> sectionRows(ErpConnection& erp, const QString& sql, const E
     return rows;
 }
 
-// A table of captions over one row of cells, each cell with its own class
-// (empty for none).
-void classedCaptionTable(CardPage& page, const QStringList& captions, const QStringList& cells,
-                         const QStringList& classes)
-{
-    page.line(QStringLiteral("   <table width='100%'>"));
-    page.line(QStringLiteral("    <tr>"));
-    for (const QString& c : captions)
-        page.line(QStringLiteral("     <td class=Cap>") + HtmlText(c) + QStringLiteral("</td>"));
-    page.line(QStringLiteral("    </tr>"));
-    page.line(QStringLiteral("    <tr>"));
-    for (qsizetype i = 0; i < cells.size(); ++i) {
-        const QString cls = i < classes.size() ? classes[i] : QString();
-        page.line((cls.isEmpty() ? QStringLiteral("     <td>") : QStringLiteral("     <td class=%1>").arg(cls))
-                  + cells[i] + QStringLiteral("</td>"));
-    }
-    page.line(QStringLiteral("    </tr>"));
-    page.line(QStringLiteral("   </table>"));
-}
-
 } // namespace
 
 PriorityInfo::PriorityInfo(std::shared_ptr<PageViewer> pages, std::shared_ptr<Prompt> prompt)
@@ -195,9 +175,9 @@ void PriorityInfo::writeItem(CardPage& page, ErpConnection& erp, const QVariantL
                        QStringLiteral("ברקוד")},
                       {QStringLiteral("<b>") + codeCell(item.value(1)) + QStringLiteral("</b>"),
                        textCell(item.value(2)), family, codeCell(item.value(6))});
-    classedCaptionTable(page, {QStringLiteral("יח מידה"), QStringLiteral("שם לועזי"), QStringLiteral("ספק מועדף")},
-                        {textCell(item.value(5)), textCell(item.value(7)), textCell(item.value(8))},
-                        {QString(), QStringLiteral("TDEng"), QString()});
+    page.captionTable({QStringLiteral("יח מידה"), QStringLiteral("שם לועזי"), QStringLiteral("ספק מועדף")},
+                      {textCell(item.value(5)), textCell(item.value(7)), textCell(item.value(8))},
+                      {QString(), QStringLiteral("class=TDEng dir=ltr"), QString()});
 
     const auto pictures = sectionRows(erp,
                                       QStringLiteral("SELECT PEF.EXTFILENAME"
@@ -232,7 +212,9 @@ void PriorityInfo::writeItem(CardPage& page, ErpConnection& erp, const QVariantL
                       + QStringLiteral("</td></tr>"));
     };
     textSection(QStringLiteral("PARTTEXT"), QStringLiteral("תאור בעברית:"), QString());
-    textSection(QStringLiteral("PARTTEXTLANG"), QStringLiteral("תאור באנגלית:"), QStringLiteral(" class=TDEng"));
+    // Latin text runs left to right: in the page's right-to-left flow its
+    // closing full stop would otherwise land at the start of the line.
+    textSection(QStringLiteral("PARTTEXTLANG"), QStringLiteral("תאור באנגלית:"), QStringLiteral(" class=TDEng dir=ltr"));
     page.line(QStringLiteral("   </table>"));
     page.line(QStringLiteral("  </td>"));
     page.line(QStringLiteral(" </tr>"));

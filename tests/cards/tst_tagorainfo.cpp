@@ -183,18 +183,47 @@ private slots:
                 "      b.dataset.columns = c.getBoundingClientRect().left > n.getBoundingClientRect().left ? 'rtl' : 'ltr';\n"
                 "  } };</script>\n");
         p.close();
-        QProcess browser;
-        browser.start(chromium, {"--headless", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run",
-                                 "--disable-background-networking", "--disable-component-update", "--disable-sync",
-                                 "--user-data-dir=" + probeDir.filePath(QStringLiteral("profile")),
-                                 "--virtual-time-budget=5000", "--dump-dom", QUrl::fromLocalFile(probe).toString()});
-        QVERIFY(browser.waitForFinished(120000));
-        const QString dom = QString::fromUtf8(browser.readAllStandardOutput());
+        const QString dom = dumpDom(chromium, probe, probeDir.filePath(QStringLiteral("profile")));
         const QRegularExpressionMatch body = QRegularExpression(QStringLiteral("<body([^>]*)>")).match(dom);
-        QVERIFY2(body.hasMatch(), qPrintable(dom.left(400) + browser.readAllStandardError().right(400)));
+        QVERIFY2(body.hasMatch(), qPrintable(dom.left(400)));
         QVERIFY2(body.captured(1).contains(QStringLiteral("data-direction=\"rtl\"")), qPrintable(body.captured(1)));
         QVERIFY2(body.captured(1).contains(QStringLiteral("data-first-right=\"true\"")), qPrintable(body.captured(1)));
         QVERIFY2(body.captured(1).contains(QStringLiteral("data-columns=\"rtl\"")), qPrintable(body.captured(1)));
+    }
+
+    // A desktop browser cannot be driven, so the waiting page moves its
+    // window on itself: after navigate(), opening it lands on the page named,
+    // even from a folder whose name needs escaping in an address.
+    void waitPageMovesOn()
+    {
+        const QString chromium = QStandardPaths::findExecutable(QStringLiteral("chromium"));
+        if (chromium.isEmpty())
+            QSKIP("chromium is not installed");
+        QTemporaryDir dir;
+        const QString folder = dir.filePath(QStringLiteral("O'Brien #1 %20 תיקייה"));
+        QVERIFY(QDir().mkpath(folder));
+        const QString wait = folder + QStringLiteral("/wait.htm");
+        const QString card = folder + QStringLiteral("/card.htm");
+        QVERIFY(WriteCardWaitPage(wait, QStringLiteral("#287B00"), true).isEmpty());
+        QFile target(card);
+        QVERIFY(target.open(QIODevice::WriteOnly) && target.write("<html><body data-arrived=\"yes\"></body></html>"));
+        target.close();
+        QString error;
+        QVERIFY2(DesktopPageViewer().navigate(wait, card, &error), qPrintable(error));
+        const QString dom = dumpDom(chromium, wait, dir.filePath(QStringLiteral("profile")));
+        QVERIFY2(dom.contains(QStringLiteral("data-arrived=\"yes\"")), qPrintable(dom.left(400)));
+    }
+
+private:
+    static QString dumpDom(const QString& chromium, const QString& page, const QString& profile)
+    {
+        QProcess browser;
+        browser.start(chromium, {"--headless", "--no-sandbox", "--disable-gpu", "--disable-quic", "--no-first-run",
+                                 "--disable-background-networking", "--disable-component-update", "--disable-sync",
+                                 "--user-data-dir=" + profile, "--virtual-time-budget=5000", "--dump-dom",
+                                 QUrl::fromLocalFile(page).toString()});
+        browser.waitForFinished(120000);
+        return QString::fromUtf8(browser.readAllStandardOutput());
     }
 };
 
