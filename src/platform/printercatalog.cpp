@@ -65,3 +65,13 @@ void SetBrowserPrinter(const QString& printer, SettingsStore& store)
 }
 
 } // namespace tagora
+
+namespace tagora {
+
+bool PrintFileOnCups(const QString&, const QString&, bool, const QString&, int, QString* error)
+{
+    *error = QStringLiteral("not yet");
+    return false;
+}
+
+} // namespace tagora

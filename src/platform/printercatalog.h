@@ -38,6 +38,14 @@ public:
 // description when there is no such printer or the choice cannot be kept.
 bool SetDefaultPrinter(const QString& printer, QString* error);
 
+// Sends a file to a CUPS printer as one job: a PDF to be printed, or with raw
+// the bytes as they are (a thermal printer's own language). The server is the
+// user's CUPS, or the one CUPS_SERVER names. True once CUPS has taken the job;
+// false with CUPS's reason when the printer does not exist or refuses jobs,
+// or when the server does not answer within timeoutSeconds.
+bool PrintFileOnCups(const QString& printer, const QString& path, bool raw, const QString& title,
+                     int timeoutSeconds, QString* error);
+
 // The printer the browser's page setup should print on, kept in the settings
 // (section "PageSetup", key "printer"); written only when it differs.
 void SetBrowserPrinter(const QString& printer, SettingsStore& store);
