@@ -22,13 +22,12 @@ import difflib
 import html.parser
 import os
 import re
-import shutil
 import sqlite3
 import sys
 import tempfile
 import urllib.parse
 
-from checkrun import erp_text, finish, run_cli, visual_to_logical, write_odbc
+from checkrun import erp_text, finish, private_host, run_cli, visual_to_logical, write_odbc
 
 EPOCH = dt.date(1988, 1, 1)
 TODAY = dt.date.today()
@@ -335,12 +334,7 @@ def pages_of(stdout):
 
 def check_type(cli, work, conn_type):
     folder = os.path.join(work, f"type{conn_type}")
-    os.makedirs(folder, exist_ok=True)
-    temp = os.path.join(folder, "temp")
-    os.makedirs(temp, exist_ok=True)
-    env = dict(os.environ, ODBCSYSINI=folder, ODBCINI=os.path.join(folder, "user-odbc.ini"), Temp=temp,
-               QT_QPA_PLATFORM="offscreen")
-    ini = os.path.join(folder, "tagora.ini")
+    env, ini, temp = private_host(folder)
     erp = os.path.join(folder, "erp.sqlite")
     write_odbc(folder, erp)
     # The demo company gives a data folder made the way an import makes it.

@@ -47,6 +47,18 @@ def erp_text(value, default, conn_type):
 # ------------------------------------------------------------------ the ERP
 
 
+def private_host(folder):
+    """A folder of the host's own: the ODBC drivers, data sources kept in it,
+    the pages' Temp folder and no display. Gives (env, settings file, temp)."""
+    os.makedirs(folder, exist_ok=True)
+    shutil.copy("/etc/odbcinst.ini", os.path.join(folder, "odbcinst.ini"))
+    temp = os.path.join(folder, "temp")
+    os.makedirs(temp, exist_ok=True)
+    env = dict(os.environ, ODBCSYSINI=folder, ODBCINI=os.path.join(folder, "user-odbc.ini"), Temp=temp,
+               QT_QPA_PLATFORM="offscreen")
+    return env, os.path.join(folder, "tagora.ini"), temp
+
+
 def write_odbc(folder, erp_path):
     shutil.copy("/etc/odbcinst.ini", os.path.join(folder, "odbcinst.ini"))
     with open(os.path.join(folder, "odbc.ini"), "w") as f:

@@ -31,7 +31,7 @@ import subprocess
 import sys
 import tempfile
 
-from checkrun import finish, run_cli
+from checkrun import finish, private_host, run_cli
 
 LINE_KEYS = ["UseCell", "FldID", "ViewType", "Align", "Font", "FontSize", "FontWeight", "FontUL",
              "FontItalic", "Direction", "Prefix", "Height", "Border"]
@@ -343,13 +343,7 @@ def main():
     args = ap.parse_args()
     args.cli = os.path.abspath(args.cli)
     work = args.keep or tempfile.mkdtemp(prefix="labdef-check-")
-    os.makedirs(work, exist_ok=True)
-    shutil.copy("/etc/odbcinst.ini", os.path.join(work, "odbcinst.ini"))
-    temp = os.path.join(work, "temp")
-    os.makedirs(temp, exist_ok=True)
-    env = dict(os.environ, ODBCSYSINI=work, ODBCINI=os.path.join(work, "odbc.ini"), Temp=temp,
-               QT_QPA_PLATFORM="offscreen")
-    ini = os.path.join(work, "tagora.ini")
+    env, ini, temp = private_host(work)
     demo = os.path.join(work, "demo")
     r = run_cli(args.cli, env, ini, ["--demo", demo])
     r = run_cli(args.cli, env, ini, ["set", "cmbPriceField", "1", "click", "cmdSaveDef2", "click", "CmdImportItems"])
