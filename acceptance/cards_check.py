@@ -21,7 +21,6 @@ import datetime as dt
 import difflib
 import html.parser
 import os
-import re
 import sqlite3
 import sys
 import tempfile
