@@ -13,6 +13,8 @@
 #include <QXmlStreamReader>
 #include <QXmlStreamWriter>
 
+#include <algorithm>
+
 #include <zlib.h>
 
 namespace tagora {
@@ -350,6 +352,10 @@ bool GlabelsSink::openLabel(const QString& file, QString* error)
     // A file opened over another sends the other's labels first: they are never dropped.
     if (m_open && !closeLabel(error))
         return false;
+    // Before any record is collected: labels that cannot be made are not collected.
+    QString program;
+    if (!canMakeLabels(&program, error))
+        return false;
     GlabelsDocument document;
     if (!ReadGlabelsDocument(file, &document, error))
         return false;
@@ -411,6 +417,20 @@ bool GlabelsSink::closeLabel(QString* error)
     return ok;
 }
 
+bool GlabelsSink::canMakeLabels(QString* program, QString* error) const
+{
+    *program = QStandardPaths::findExecutable(kBatchProgram);
+    if (program->isEmpty()) {
+        *error = QStringLiteral("glabels-3-batch לא נמצא: יש להתקין את gLabels (החבילה glabels) כדי להדפיס דרכו");
+        return false;
+    }
+    if (m_options.jobFolder.isEmpty() || !QFileInfo(m_options.jobFolder).isDir()) {
+        *error = QStringLiteral("תיקיית העבודה '%1' אינה קיימת").arg(native(m_options.jobFolder));
+        return false;
+    }
+    return true;
+}
+
 QString GlabelsSink::nextStem()
 {
     const QDir dir(m_options.jobFolder);
@@ -427,16 +447,10 @@ QString GlabelsSink::nextStem()
 
 bool GlabelsSink::makeLabels(QString* error)
 {
-    const QString program = QStandardPaths::findExecutable(kBatchProgram);
-    if (program.isEmpty()) {
-        *error = QStringLiteral("glabels-3-batch לא נמצא: יש להתקין את gLabels (החבילה glabels) כדי להדפיס דרכו");
+    QString program;
+    if (!canMakeLabels(&program, error))
         return false;
-    }
     const QDir dir(m_options.jobFolder);
-    if (m_options.jobFolder.isEmpty() || !dir.exists()) {
-        *error = QStringLiteral("תיקיית העבודה '%1' אינה קיימת").arg(native(m_options.jobFolder));
-        return false;
-    }
     const QString stem = nextStem();
     const QString csvPath = dir.absoluteFilePath(stem + QStringLiteral(".csv"));
     const QString docPath = dir.absoluteFilePath(stem + QStringLiteral(".glabels"));

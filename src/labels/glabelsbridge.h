@@ -51,6 +51,7 @@ public:
     QStringList keptFiles() const { return m_kept; }
 
 private:
+    bool canMakeLabels(QString* program, QString* error) const;
     bool makeLabels(QString* error);
     bool runBatch(const QString& program, const QString& document, const QString& csv, const QString& pdf,
                   int expectedPages, QString* error);

@@ -236,7 +236,7 @@ private slots:
         QTest::newRow("truncated gzip") << "cut.glabels" << gzip(QByteArray(4000, 'x')).left(30)
                                         << "ItemKey" << real << QString() << "open" << "cut.glabels" << false;
         QTest::newRow("glabels-3-batch missing")
-            << "demo" << QByteArray() << "ItemKey" << "none" << QString() << "close" << "glabels-3-batch לא נמצא"
+            << "demo" << QByteArray() << "ItemKey" << "none" << QString() << "open" << "glabels-3-batch לא נמצא"
             << false;
         // Stand-ins for the program's ways of failing: hung, exit 0 with nothing made, a wrong merge.
         QTest::newRow("program hangs") << "demo" << QByteArray() << "ItemKey"
@@ -266,7 +266,7 @@ private slots:
         QFETCH(QString, failingCall);
         QFETCH(QString, message);
         QFETCH(bool, workFilesKept);
-        if (program == u"real" && failingCall == u"close" && QStandardPaths::findExecutable(QStringLiteral("glabels-3-batch")).isEmpty())
+        if (program == u"real" && QStandardPaths::findExecutable(QStringLiteral("glabels-3-batch")).isEmpty())
             QSKIP("glabels-3-batch is not installed");
 
         QTemporaryDir dir;
