@@ -8,6 +8,9 @@
 #include "labels/labelfields.h"
 #include "labels/labelrun.h"
 #include "labels/programautomation.h"
+#include "labels/bridges.h"
+#include "labels/directlabels.h"
+#include "labels/labelprograms.h"
 #include "platform/prompt.h"
 #include "platform/settingsstore.h"
 
@@ -21,8 +24,6 @@
 namespace tagora {
 
 namespace {
-const QString kAutomationSection = QStringLiteral("Automation");
-const QString kJournalKey = QStringLiteral("JournalFile");
 
 // The ticks and expressions of the label field table, read the same way for
 // the query and for the fields a run sends, so the two agree on every column.
@@ -101,6 +102,20 @@ short MainCard::RunOLE(const QString& DefaultLabelName, short /*Copies*/, uchar 
     const QString journal = m_services.settings->value(kSettingsApp, kAutomationSection, kJournalKey).value_or(QString());
     if (!journal.trimmed().isEmpty())
         registry.setFallback(std::make_shared<JournalProvider>(journal.trimmed()));
+    // A bridge the settings choose serves the program: its labels reach the
+    // printer chosen on the general tab, or stay in the job folder.
+    const QString progId = LabelProgram::progId(pServerType);
+    if (const QString bridge = ChosenBridge(*m_services.settings, progId); !progId.isEmpty() && !bridge.isEmpty()) {
+        const QString folder = directJobFolder();
+        QString problem = IsKnownBridge(bridge) ? PrepareJobFolder(folder)
+                                                : QStringLiteral("גשר ההדפסה '%1' אינו מוכר").arg(bridge);
+        if (!problem.isEmpty()) {
+            m_services.prompt->critical(QStringLiteral("תקלה במשלוח נתונים להדפסה"), problem);
+            return 0;
+        }
+        const QString printer = ui->cmbPrinter->currentIndex() >= 0 ? ui->cmbPrinter->currentText() : QString();
+        registry.add(progId, MakeBridgeProvider(bridge, BridgeOptionsFrom(*m_services.settings, printer, folder)));
+    }
 
     const LabelRunResult result = RunLabelProgram(r, registry, this, [] { QCoreApplication::processEvents(); });
     switch (result.status) {
