@@ -10,6 +10,7 @@ PACKAGES=(
   unixodbc unixodbc-dev libsqliteodbc odbc-postgresql postgresql
   fonts-dejavu-core
   libzint-dev zint zbar-tools libcups2-dev chromium
+  cups cups-bsd cups-client glabels poppler-utils libfribidi-dev
 )
 
 missing=()
