@@ -6,6 +6,7 @@
 namespace tagora {
 
 namespace {
+const QString kArrow = QStringLiteral("\u200F←\u200F");
 const QString kSection = QStringLiteral("Automation");
 
 QString read(const SettingsStore& store, const QString& key)
@@ -40,16 +41,20 @@ QString OutputDescription(int programCode, const OutputSettings& settings, const
     }
     if (LabelProgram::progId(programCode).isEmpty())
         return {};
+    // The screen reads right to left: the arrow points from the bridge on the
+    // right to where its labels go on the left. Marks hold it in the right-
+    // to-left run, or between two Latin names ("ZPL", a host) it would join
+    // their left-to-right run and point back at the bridge.
     const QString target = printer.isEmpty() ? QStringLiteral("קובץ PDF בתיקיית העבודה")
                                              : QStringLiteral("מדפסת %1").arg(printer);
     if (settings.bridge == QLatin1String("glabels"))
-        return QStringLiteral("פלט: gLabels → %1").arg(target);
+        return QStringLiteral("פלט: gLabels %1 %2").arg(kArrow, target);
     if (settings.bridge == QLatin1String("zpl")) {
         if (!settings.zplHost.isEmpty())
-            return QStringLiteral("פלט: ZPL → %1").arg(settings.zplHost);
+            return QStringLiteral("פלט: ZPL %1 %2").arg(kArrow, settings.zplHost);
         if (printer.isEmpty())
-            return QStringLiteral("פלט: ZPL → לא נבחרה מדפסת");
-        return QStringLiteral("פלט: ZPL → מדפסת %1").arg(printer);
+            return QStringLiteral("פלט: ZPL %1 לא נבחרה מדפסת").arg(kArrow);
+        return QStringLiteral("פלט: ZPL %1 מדפסת %2").arg(kArrow, printer);
     }
     // A bridge name we do not know is shown, not silently taken for the journal.
     if (!settings.bridge.isEmpty())
