@@ -27,7 +27,6 @@ private slots:
         QTest::newRow("other program's key ignored") << "Bridge=glabels\nBarTender.Application=zpl\n" << 7 << "glabels" << 60;
         QTest::newRow("empty program key falls back") << "Bridge=zpl\nNiceLabel.Application=\n" << 5 << "zpl" << 60;
         QTest::newRow("bad timeout") << "Timeout=soon\n" << 5 << QString() << 60;
-        QTest::newRow("zero timeout") << "Timeout=0\n" << 5 << QString() << 60;
     }
 
     void settingsChooseBridge()
@@ -58,14 +57,10 @@ private slots:
         QTest::addColumn<bool>("autoPrint");
         QTest::addColumn<QStringList>("names");
         QTest::addColumn<QStringList>("notNames");
-        QTest::newRow("journal") << 5 << "" << "" << "P1" << false << QStringList{"journal"} << QStringList{"P1"};
         QTest::newRow("unknown bridge is named") << 5 << "cups" << "" << "P1" << false << QStringList{"journal", "cups"} << QStringList{};
-        QTest::newRow("glabels to printer") << 2 << "glabels" << "" << "P1" << false << QStringList{"gLabels", "P1"} << QStringList{};
         QTest::newRow("glabels, no printer") << 2 << "glabels" << "" << "" << false << QStringList{"gLabels", "PDF"} << QStringList{};
         QTest::newRow("zpl host beats printer") << 4 << "zpl" << "10.0.0.5:9100" << "P1" << false
                                                 << QStringList{"ZPL", "10.0.0.5:9100"} << QStringList{"P1"};
-        QTest::newRow("zpl to printer") << 7 << "zpl" << "" << "P1" << false << QStringList{"ZPL", "P1"} << QStringList{};
-        QTest::newRow("direct, browser") << 6 << "glabels" << "" << "P1" << false << QStringList{"דפדפן"} << QStringList{"gLabels", "P1"};
         QTest::newRow("direct, auto print, printer") << 6 << "" << "" << "P1" << true << QStringList{"PDF", "P1"} << QStringList{};
         QTest::newRow("direct, auto print, no printer") << 6 << "" << "" << "" << true << QStringList{"דפדפן"} << QStringList{"PDF"};
     }
