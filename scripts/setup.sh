@@ -10,7 +10,7 @@ PACKAGES=(
   unixodbc unixodbc-dev libsqliteodbc odbc-postgresql postgresql
   fonts-dejavu-core
   libzint-dev zint zbar-tools libcups2-dev chromium
-  libfribidi-dev glabels poppler-utils zlib1g-dev
+  cups cups-bsd cups-client glabels poppler-utils libfribidi-dev zlib1g-dev
 )
 
 missing=()

@@ -1,5 +1,6 @@
 #include "control/maincard.h"
 
+#include "control/outputchoice.h"
 #include "control/settingstable.h"
 #include "dialogs/frmaccdef.h"
 #include "dialogs/frmalteritems.h"
@@ -9,6 +10,7 @@
 #include "dialogs/frmlabdef.h"
 #include "dialogs/frmselectdocitem.h"
 #include "dialogs/frmselectitem.h"
+#include "labels/directlayout.h"
 #include "labels/itemquery.h"
 #include "labels/labelfields.h"
 #include "labels/labelprograms.h"
@@ -252,6 +254,13 @@ void MainCard::connectHandlers()
             SetGetLabelDefs(2);
     });
     connect(ui->txtFromDocNum, &QLineEdit::textChanged, this, &MainCard::txtFromDocNum_Change);
+    for (int i = 0; i < 5; ++i)
+        if (auto* option = control<QRadioButton>(indexed("OptOLE", i)))
+            connect(option, &QRadioButton::toggled, this, [this](bool on) {
+                if (on)
+                    updateOutputLabel();
+            });
+    connect(ui->cmbPrinter, &QComboBox::currentIndexChanged, this, &MainCard::updateOutputLabel);
 }
 
 QObject* MainCard::control(const QString& name) const
@@ -278,6 +287,20 @@ void MainCard::UserControl_Show()
         SetGetLabelDefs(2);
     control<QLabel>(QStringLiteral("lblLabelName(1)"))->setText(ui->txtLabelName->text());
     control<QLabel>(QStringLiteral("lblLabelName(2)"))->setText(ui->txtLabelName2->text());
+    updateOutputLabel();
+}
+
+void MainCard::updateOutputLabel()
+{
+    const int code = GetOLEOption();
+    const QString printer = ui->cmbPrinter->currentIndex() >= 0 ? ui->cmbPrinter->currentText() : QString();
+    ui->lblOutput->setText(OutputDescription(code, ReadOutputSettings(*m_services.settings, code), printer,
+                                             directLabelLayout().page.PageAutoPrint));
+}
+
+int MainCard::automationTimeout() const
+{
+    return ReadOutputSettings(*m_services.settings, 0).timeoutSeconds;
 }
 
 void MainCard::showEvent(QShowEvent* event)
@@ -449,6 +472,7 @@ void MainCard::cmdSaveDef_Click(int section)
     SetGetRegParams(uchar(section), 1);
     if (section == 1 && control<QRadioButton>(QStringLiteral("OptOLE(3)"))->isChecked())
         SetGetLabelDefs(1);
+    updateOutputLabel();
     const bool saved = m_services.settings->flush() && !m_saveFailed;
     // The file may have been found foreign only now (another program saved it meanwhile).
     const QString why = m_services.settings->refusal();
@@ -466,6 +490,7 @@ void MainCard::MainTab_Click(int tab)
         control<QLabel>(QStringLiteral("lblLabelName(1)"))->setText(ui->txtLabelName->text());
     else if (tab == 1)
         control<QLabel>(QStringLiteral("lblLabelName(2)"))->setText(ui->txtLabelName2->text());
+    updateOutputLabel();
 }
 
 void MainCard::lblVarNum_Click(int row)

@@ -203,6 +203,10 @@ private:
     bool prepareDirectFields(QString* error);
     // Why the label-data query of the screen's settings cannot run, or empty text.
     QString labelQueryProblem() const;
+    // The general tab's line naming where the chosen program's labels go.
+    void updateOutputLabel();
+    // Seconds each outside step of printing may take (settings, Automation).
+    int automationTimeout() const;
     // The label field table as the label-list query reads it.
     std::vector<PlateFieldRow> plateFieldRows() const;
     void ShowItemList(uchar queryType, const QString& dbPath);

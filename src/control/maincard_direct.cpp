@@ -5,6 +5,7 @@
 #include "labels/directlabels.h"
 #include "labels/directlayout.h"
 #include "labels/labelfields.h"
+#include "labels/pagepdf.h"
 #include "localdb/database.h"
 #include "localdb/schema.h"
 #include "platform/pageviewer.h"
@@ -61,6 +62,7 @@ void MainCard::SetGetLabelDefs(int action)
     tagora::SetGetLabelDefs(action, directLabelLayout(), store);
     if (action == 2)
         m_layoutLoaded = true;
+    updateOutputLabel();
 }
 
 bool MainCard::SetDefaultPrinter(const QString& printer, QString* error)
@@ -141,12 +143,28 @@ bool MainCard::PrintDirectLabels(uchar queryType, const QString& dbPath, bool by
         }
     }
     const QString page = QDir(folder).filePath(QStringLiteral("tgrlab1.htm"));
+    // Printed automatically on a chosen printer: the page goes to the printer
+    // as a PDF, with no dialog for anyone to answer. The page written for it
+    // must not call print on load, or headless Chromium writes no PDF.
+    const bool straightToPrinter = layout.page.PageAutoPrint && ui->cmbPrinter->currentIndex() >= 0;
+    DirectLabelLayout written = layout;
+    if (straightToPrinter)
+        written.page.PageAutoPrint = false;
     long long labels = 0;
-    error = CreateLabPage(page, dbPath, sql, layout, ui->txtPriceFormat->text(), this, &labels);
+    error = CreateLabPage(page, dbPath, sql, written, ui->txtPriceFormat->text(), this, &labels);
     if (!error.isEmpty())
         return fail(error);
-    if (!m_services.pages->showPage(page, &error))
+    if (straightToPrinter) {
+        const QString printer = ui->cmbPrinter->currentText();
+        const int timeout = automationTimeout();
+        const QString pdf = QDir(folder).filePath(QStringLiteral("tgrlab1.pdf"));
+        if (!(error = RenderPageToPdf(page, pdf, timeout)).isEmpty())
+            return fail(error);
+        if (!PrintFileOnCups(printer, pdf, false, QStringLiteral("מדבקות פריטים"), timeout, &error))
+            return fail(error);
+    } else if (!m_services.pages->showPage(page, &error)) {
         return fail(error);
+    }
 
     // A value the barcode cannot carry gets no picture rather than a wrong
     // one; the user learns which labels lack theirs.

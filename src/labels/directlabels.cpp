@@ -217,6 +217,7 @@ bool isJobFile(const QString& name)
 {
     static const QRegularExpression picture(QStringLiteral("^B[0-9]{7,}\\.BMP$"));
     return name == QLatin1String("tgrlab1.htm") || name == QLatin1String("tgrlab2.htm")
+        || name == QLatin1String("tgrlab1.pdf") || name == QLatin1String("tgrlab1.pdf.part")
         || picture.match(name).hasMatch();
 }
 

@@ -21,7 +21,7 @@ QString UserTempFolder();
 QString directJobFolder();
 // Makes the job folder (mode 0700) or takes it as it stands: a link, a folder
 // of another user or one others may write to is refused with the reason.
-// Then removes what earlier jobs left there (the label page, the item list
+// Then removes what earlier jobs left there (the label page, its PDF, the item list
 // and the barcode pictures), and nothing else. Empty text on success.
 QString PrepareJobFolder(const QString& folder);
 
