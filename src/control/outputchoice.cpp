@@ -1,5 +1,6 @@
 #include "control/outputchoice.h"
 
+#include "labels/bridges.h"
 #include "labels/labelprograms.h"
 #include "platform/settingsstore.h"
 
@@ -7,27 +8,18 @@ namespace tagora {
 
 namespace {
 const QString kArrow = QStringLiteral("\u200F←\u200F");
-const QString kSection = QStringLiteral("Automation");
-
-QString read(const SettingsStore& store, const QString& key)
-{
-    return store.value(kSettingsApp, kSection, key).value_or(QString()).trimmed();
-}
 } // namespace
 
+// Read as the run reads them, so the line never names another output.
 OutputSettings ReadOutputSettings(const SettingsStore& store, int programCode)
 {
     OutputSettings s;
     const QString progId = LabelProgram::progId(programCode);
-    QString bridge = progId.isEmpty() ? QString() : read(store, progId);
-    if (bridge.isEmpty())
-        bridge = read(store, QStringLiteral("Bridge"));
-    s.bridge = bridge.toLower();
-    s.zplHost = read(store, QStringLiteral("ZplHost"));
-    bool ok = false;
-    const int timeout = read(store, QStringLiteral("Timeout")).toInt(&ok);
-    if (ok && timeout > 0)
-        s.timeoutSeconds = timeout;
+    s.bridge = progId.isEmpty() ? QString() : ChosenBridge(store, progId);
+    const BridgeOptions options = BridgeOptionsFrom(store, QString(), QString());
+    s.zplHost = options.zplHost;
+    s.timeoutSeconds = options.timeoutSeconds;
+    s.journal = !store.value(kSettingsApp, kAutomationSection, kJournalKey).value_or(QString()).trimmed().isEmpty();
     return s;
 }
 
@@ -53,13 +45,15 @@ QString OutputDescription(int programCode, const OutputSettings& settings, const
         if (!settings.zplHost.isEmpty())
             return QStringLiteral("פלט: ZPL %1 %2").arg(kArrow, settings.zplHost);
         if (printer.isEmpty())
-            return QStringLiteral("פלט: ZPL %1 לא נבחרה מדפסת").arg(kArrow);
+            return QStringLiteral("פלט: ZPL %1 קובץ בתיקיית העבודה").arg(kArrow);
         return QStringLiteral("פלט: ZPL %1 מדפסת %2").arg(kArrow, printer);
     }
-    // A bridge name we do not know is shown, not silently taken for the journal.
+    // A bridge name we do not know fails the run rather than print elsewhere; the line says so.
     if (!settings.bridge.isEmpty())
-        return QStringLiteral("פלט: יומן (journal); הגשר '%1' אינו מוכר").arg(settings.bridge);
-    return QStringLiteral("פלט: יומן (journal)");
+        return QStringLiteral("פלט: הגשר '%1' אינו מוכר, ההדפסה תיכשל").arg(settings.bridge);
+    if (settings.journal)
+        return QStringLiteral("פלט: יומן (journal)");
+    return QStringLiteral("פלט: לא הוגדר גשר הדפסה");
 }
 
 } // namespace tagora

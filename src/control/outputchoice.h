@@ -12,9 +12,10 @@ class SettingsStore;
 //   ZplHost      "host:port": raw ZPL over a socket rather than the printer
 //   Timeout      seconds for each outside step (60 when unset or not a count)
 struct OutputSettings {
-    QString bridge;     // lower case; empty: the journal
+    QString bridge;       // lower case; empty: none
     QString zplHost;
     int timeoutSeconds = 60;
+    bool journal = false; // JournalFile set: programs without a bridge write the journal
 };
 
 OutputSettings ReadOutputSettings(const SettingsStore& store, int programCode);

@@ -57,7 +57,8 @@ private slots:
         QTest::addColumn<bool>("autoPrint");
         QTest::addColumn<QStringList>("names");
         QTest::addColumn<QStringList>("notNames");
-        QTest::newRow("unknown bridge is named") << 5 << "cups" << "" << "P1" << false << QStringList{"journal", "cups"} << QStringList{};
+        QTest::newRow("unknown bridge is named") << 5 << "cups" << "" << "P1" << false << QStringList{"cups"} << QStringList{"journal"};
+        QTest::newRow("zpl, nowhere chosen") << 7 << "zpl" << "" << "" << false << QStringList{"ZPL", "תיקיית העבודה"} << QStringList{};
         QTest::newRow("glabels, no printer") << 2 << "glabels" << "" << "" << false << QStringList{"gLabels", "PDF"} << QStringList{};
         QTest::newRow("zpl host beats printer") << 4 << "zpl" << "10.0.0.5:9100" << "P1" << false
                                                 << QStringList{"ZPL", "10.0.0.5:9100"} << QStringList{"P1"};

@@ -1,11 +1,13 @@
 // Printing for real from the print button: the marked items through a
 // bridge chosen in the settings, out to paper's stand-ins (a PDF, a socket).
 #include "support/cardfixture.h"
+#include "support/cupsqueue.h"
 #include "support/labeldata.h"
 
 #include "labels/glabelsbridge.h"
 
 #include <QCheckBox>
+#include <QComboBox>
 #include <QDir>
 #include <QProcess>
 #include <QPushButton>
@@ -55,22 +57,27 @@ private slots:
     void init() { qputenv("Temp", work.filePath(QStringLiteral("temp")).toUtf8()); }
     void cleanup() { qunsetenv("Temp"); }
 
-    // Through the gLabels bridge: one page per label, in order, with each
-    // item's texts and a barcode that reads back.
+    // Through the gLabels bridge to a CUPS queue: one page per label, in
+    // order, with each item's texts and a barcode that reads back.
     void glabelsPdf()
     {
         if (QStandardPaths::findExecutable("glabels-3-batch").isEmpty()
             || QStandardPaths::findExecutable("pdftotext").isEmpty() || QStandardPaths::findExecutable("zbarimg").isEmpty())
             QSKIP("glabels-3-batch, pdftotext or zbarimg is not installed");
+        if (const QString why = cupsqueue::unavailable(); !why.isEmpty())
+            QSKIP(qPrintable(why));
         LabelData data(kBarcodes);
         QString error;
         const QString label = DemoGlabelsLabel(work.filePath("labels"), &error);
         QVERIFY2(!label.isEmpty(), qPrintable(error));
-        const auto f = printingCard(data, label, QStringLiteral("Bridge=glabels"));
+        const auto f = printingCard(data, label, QStringLiteral("Bridge=glabels"), {cupsqueue::kPdfQueue});
+        auto* printers = f->c<QComboBox>("cmbPrinter");
+        printers->setCurrentIndex(printers->findText(cupsqueue::kPdfQueue));
+        cupsqueue::clear(cupsqueue::kPdfQueue);
         f->c<QPushButton>("cmdPrintItmes")->click();
         QCOMPARE(f->prompt->lines(), QStringList());
-        const QString pdf = work.filePath("temp/tgrlab/tgrlab-001.pdf");
-        QVERIFY(QFile::exists(pdf));
+        const QString pdf = cupsqueue::waitForJob(cupsqueue::kPdfQueue);
+        QVERIFY(!pdf.isEmpty());
 
         QStringList pages = run("pdftotext", {"-layout", pdf, "-"}).split('\f', Qt::SkipEmptyParts);
         QCOMPARE(pages.size(), 6);
