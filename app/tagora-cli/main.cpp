@@ -9,6 +9,7 @@
 #include "cards/tagorainfo.h"
 #include "control/maincard.h"
 #include "control/settingstable.h"
+#include "labels/glabelsbridge.h"
 #include "erp/demosetup.h"
 #include "platform/controlbinding.h"
 #include "platform/filedialog.h"
@@ -306,7 +307,11 @@ private:
             if (m_card)
                 return fail(QStringLiteral("--demo must come before the first verb"));
             const QString dir = take();
-            const QString e = SetupDemoCompany(dir, m_demo, store());
+            QString e = SetupDemoCompany(dir, m_demo, store());
+            // The sample labels of the two bridges, for a user to choose as label files.
+            for (const char* sample : {"demo-item.glabels", "demo-item.zpl"})
+                if (e.isEmpty() && DemoLabel(QDir(dir).filePath(QStringLiteral("labels")), QLatin1String(sample), &e).isEmpty())
+                    break;
             if (!e.isEmpty())
                 return fail(e);
             out(QStringLiteral("demo company ready in %1 (data source %2)").arg(dir, kDemoDsn));

@@ -565,14 +565,14 @@ bool GlabelsSink::runBatch(const QString& program, const QString& document, cons
     return true;
 }
 
-QString DemoGlabelsLabel(const QString& folder, QString* error)
+QString DemoLabel(const QString& folder, const QString& fileName, QString* error)
 {
-    const QString path = QDir(folder).absoluteFilePath(QStringLiteral("demo-item.glabels"));
+    const QString path = QDir(folder).absoluteFilePath(fileName);
     if (QFileInfo::exists(path))
         return path;
-    QFile supplied(QStringLiteral(":/tagora/labels/demo-item.glabels"));
+    QFile supplied(QStringLiteral(":/tagora/labels/") + fileName);
     if (!supplied.open(QIODevice::ReadOnly)) {
-        *error = QStringLiteral("מדבקת הדוגמה חסרה בתוכנה");
+        *error = QStringLiteral("מדבקת הדוגמה %1 חסרה בתוכנה").arg(fileName);
         return QString();
     }
     if (!QDir().mkpath(folder)) {
@@ -582,6 +582,11 @@ QString DemoGlabelsLabel(const QString& folder, QString* error)
     if (!writeFile(path, supplied.readAll(), error))
         return QString();
     return path;
+}
+
+QString DemoGlabelsLabel(const QString& folder, QString* error)
+{
+    return DemoLabel(folder, QStringLiteral("demo-item.glabels"), error);
 }
 
 } // namespace tagora

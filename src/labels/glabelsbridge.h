@@ -74,5 +74,8 @@ private:
 // of that name is there already (it may have been edited since). Its path,
 // or empty text with a description in *error.
 QString DemoGlabelsLabel(const QString& folder, QString* error);
+// The same for any of the project's sample labels by file name
+// ("demo-item.glabels", "demo-item.zpl").
+QString DemoLabel(const QString& folder, const QString& fileName, QString* error);
 
 } // namespace tagora
