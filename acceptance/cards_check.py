@@ -26,7 +26,7 @@ import sys
 import tempfile
 import urllib.parse
 
-from checkrun import erp_text, finish, private_host, run_cli, visual_to_logical, write_odbc
+from checkrun import erp_text, finish, private_host, replace_section, run_cli, visual_to_logical, write_odbc
 
 EPOCH = dt.date(1988, 1, 1)
 TODAY = dt.date.today()
@@ -107,7 +107,7 @@ def make_erp(path, conn_type, company):
     db.executemany("INSERT INTO PARTPARAM VALUES (?,?)", [(i, 1 if i != 2 else 2) for i, *_ in ITEMS])
     db.executemany("INSERT INTO SUPPLIERS VALUES (?,?,?)", [(s, n, t(d_)) for s, n, d_ in SUPPLIERS])
     db.executemany("INSERT INTO PARTEXTFILE VALUES (?,?,?)",
-                   [(1, -1, "..\\pics\\o'neil.png"), (1, 1, "..\\docs\\spec.pdf"), (2, -1, "/srv/pics/plain.png"),
+                   [(1, -1, "..\\pics\\o'neil.png"), (1, 1, "..\\docs\\datasheet.pdf"), (2, -1, "/srv/pics/plain.png"),
                     (7, -1, "")])
     db.executemany("INSERT INTO PARTSPECTYPES VALUES (?,?)", [(n, t(s)) for n, s in SPEC_TYPES])
     db.execute("INSERT INTO PARTSPEC VALUES (1, ?, 'X2 & <y>', '', ?, NULL)", (t("אדום"), t("ארוך")))
@@ -167,9 +167,9 @@ def erp_expected(erp_path, key, conn_type, company):
     right = []
     names = {n: (txt(s) or f"פרמטר {n}") for n, s in db.execute("SELECT NUMBER, SPECDES FROM PARTSPECTYPES"
                                                                    " WHERE NUMBER > 0 ORDER BY NUMBER")}
-    spec = db.execute("SELECT * FROM PARTSPEC WHERE PART = ?", (part,)).fetchone()
+    params = db.execute("SELECT * FROM PARTSPEC WHERE PART = ?", (part,)).fetchone()
     for n, name in names.items():
-        value = txt(spec[f"SPEC{n}"]) if spec else ""
+        value = txt(params[f"SPEC{n}"]) if params else ""
         if value:
             right += [name + ":", value]
     he = [txt(r[0]) for r in db.execute("SELECT TEXT FROM PARTTEXT WHERE PART = ? ORDER BY TEXTORD", (part,))]
@@ -345,16 +345,8 @@ def check_type(cli, work, conn_type):
     os.makedirs(company, exist_ok=True)
     make_erp(erp, conn_type, company)
     # The connection values point at the check's ERP instead of the demo's.
-    kept, section = [], None
-    for line in open(ini, encoding="utf-8").read().splitlines():
-        if line.startswith("["):
-            section = line.strip()
-        if section != "[Params]":
-            kept.append(line)
-    kept += ["[Params]", "ConnServer=CheckErp", "ConnUID=", "ConnPWD=", "ConnDataBase=check",
-             f"ConnType={1 if conn_type == 2 else 0}", f"ConnPath={company}"]
-    with open(ini, "w", encoding="utf-8") as f:
-        f.write("\n".join(kept) + "\n")
+    replace_section(ini, "Params", ["ConnServer=CheckErp", "ConnUID=", "ConnPWD=", "ConnDataBase=check",
+                                    f"ConnType={1 if conn_type == 2 else 0}", f"ConnPath={company}"])
     summary = []
     for typed in ["O'NEIL-1", "PLAIN-2", "עברי-7", "OTHER-6", "o'neil-1"]:
         find = ["click", "cmdSelectItems", "set", "txtToItemkey", typed, "click", "cmdFindKey"]

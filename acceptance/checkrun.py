@@ -72,6 +72,18 @@ def write_settings(path, data, conn_type, extra=""):
                 f"[GeneralParams]\nDBPath={data}\n{extra}")
 
 
+def replace_section(ini, section, lines):
+    """Puts a settings section in place of the one the file holds."""
+    kept, current = [], None
+    for line in open(ini, encoding="utf-8").read().splitlines():
+        if line.startswith("["):
+            current = line.strip()
+        if current != f"[{section}]":
+            kept.append(line)
+    with open(ini, "w", encoding="utf-8") as f:
+        f.write("\n".join(kept + [f"[{section}]"] + lines) + "\n")
+
+
 def run_cli(cli, env, ini, verbs, answer=None):
     args = [cli, "--settings", ini] + (["--answer", answer] if answer else []) + verbs
     return subprocess.run(args, env=env, capture_output=True, text=True, timeout=600)

@@ -33,7 +33,7 @@ import tempfile
 import threading
 import time
 
-from checkrun import finish, private_host, run_cli
+from checkrun import finish, private_host, replace_section, run_cli
 
 ROOT = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
 COPIES = [2, 1, 3]
@@ -72,14 +72,7 @@ def field_verbs(printer, option, label=None):
 
 
 def set_automation(ini, lines):
-    kept, section = [], None
-    for line in open(ini, encoding="utf-8").read().splitlines():
-        if line.startswith("["):
-            section = line.strip()
-        if section != "[Automation]":
-            kept.append(line)
-    with open(ini, "w", encoding="utf-8") as f:
-        f.write("\n".join(kept + ["[Automation]"] + lines) + "\n")
+    replace_section(ini, "Automation", lines)
 
 
 def run(args):
@@ -224,6 +217,9 @@ def main():
     args.cli = os.path.abspath(args.cli)
     work = args.keep or tempfile.mkdtemp(prefix="printing-check-")
     env, ini, temp = private_host(work)
+    # cupsd writes the queue's file as its own user: it must be able to pass
+    # through the work folder (mkdtemp makes it private).
+    os.chmod(work, 0o711)
     cups = os.path.join(work, "cups")
     script = os.path.join(ROOT, "scripts", "cups-test-server.sh")
     subprocess.run(["bash", script, "start", cups, str(args.port)], check=True, timeout=120)
