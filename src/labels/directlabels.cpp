@@ -211,14 +211,16 @@ QString directJobFolder()
 
 namespace {
 // What a job leaves in the folder: the page and the barcode pictures named by
-// field and record (B0400012.BMP), and the item list. Nothing else there is
-// ours to remove.
+// field and record (B0400012.BMP), the item list, the page's PDF and the
+// bridges' numbered outputs. Nothing else there is ours to remove.
 bool isJobFile(const QString& name)
 {
     static const QRegularExpression picture(QStringLiteral("^B[0-9]{7,}\\.BMP$"));
+    // A bridge's outputs and the work files it keeps after a failure.
+    static const QRegularExpression bridge(QStringLiteral("^tgrlab-[0-9]{3,}\\.(pdf|zpl|csv|glabels)(\\.part)?$"));
     return name == QLatin1String("tgrlab1.htm") || name == QLatin1String("tgrlab2.htm")
         || name == QLatin1String("tgrlab1.pdf") || name == QLatin1String("tgrlab1.pdf.part")
-        || picture.match(name).hasMatch();
+        || picture.match(name).hasMatch() || bridge.match(name).hasMatch();
 }
 
 #ifdef Q_OS_UNIX

@@ -585,6 +585,8 @@ private slots:
         writeFile(folder + "/keep/tgrlab1.htm", "kept page");
         writeFile(folder + "/keep/B0400001.BMP", "kept picture");
         writeFile(folder + "/B0400009.BMP", "old picture");
+        writeFile(folder + "/tgrlab-001.pdf", "an earlier bridge's labels");
+        writeFile(folder + "/tgrlab-7.pdf", "not a name of ours");
         writeFile(temp.filePath("outside.txt"), "outside");
         QVERIFY(QFile::link(temp.filePath("outside.txt"), folder + "/B0400008.BMP"));
         const auto f = directCard(data, temp.path(), barcodeIni);
@@ -593,7 +595,7 @@ private slots:
         QCOMPARE(f->pages->shown, QStringList{folder + "/tgrlab1.htm"});
         QVERIFY(f->c<QCheckBox>("ChkFldSend(4)")->isChecked());
         QCOMPARE(QDir(folder).entryList(QDir::Files | QDir::System, QDir::Name),
-                 QStringList({"B04.BMP", "B0400002.BMP", "B0400003.BMP", "notes.txt", "tgrlab1.htm"}));
+                 QStringList({"B04.BMP", "B0400002.BMP", "B0400003.BMP", "notes.txt", "tgrlab-7.pdf", "tgrlab1.htm"}));
         QCOMPARE(readFile(folder + "/notes.txt"), QByteArray("notes"));
         QCOMPARE(readFile(folder + "/keep/tgrlab1.htm"), QByteArray("kept page"));
         QCOMPARE(readFile(folder + "/keep/B0400001.BMP"), QByteArray("kept picture"));
