@@ -198,6 +198,7 @@ private slots:
                                                << "Weight" << 1;
         const QString refused = QStringLiteral("127.0.0.1:%1").arg(closedPort());
         QTest::newRow("host refuses") << ok << refused << "v" << "close" << refused << 1;
+        QTest::newRow("host without a port number") << ok << "printer:port" << "v" << "close" << "host:port" << 1;
         // A printer that takes the connection and never reads: more than
         // the sockets can hold must not count as sent.
         const QByteArray big = "^XA^FO1,1^FD${Weight}" + QByteArray(1 << 20, 'a') + "^FS^XZ";
