@@ -20,7 +20,6 @@
 using namespace tagora;
 
 namespace {
-const QString kLong = QString(200, QLatin1Char('L'));
 const QString kTitleEnd = QStringLiteral("כרטיס פריט - תגורה של ונמר</td></tr>\r\n");
 
 QString readPage(const QString& path)
@@ -48,11 +47,10 @@ private slots:
             "INSERT INTO tItems (ItemKey, ItemName, BarCode, Fname, Weight) VALUES"
             " ('O''Neil', 'Apostrophe', NULL, NULL, NULL), ('Q\"1', 'Quote', NULL, NULL, NULL),"
             " ('מפתח', 'שלום', NULL, 'Shalom', 0.5), ('<b>&1', 'Nut & <Bolt>', '<x>', 'A&B', NULL),"
-            " ('MiX-1', 'Mixed', NULL, NULL, NULL), ('%1', 'Long', NULL, NULL, NULL);"
+            " ('MiX-1', 'Mixed', NULL, NULL, NULL);"
             "INSERT INTO tPLName VALUES (3, 'Retail <A&B>');"
             "INSERT INTO tAlterPrices VALUES ('Zed', 'A1', 12345.5, NULL);"
-            "UPDATE tAccountDef SET LabelName = 'main.lbl', Label2Name = 'second <2>.lbl';")
-                                                  .arg(kLong));
+            "UPDATE tAccountDef SET LabelName = 'main.lbl', Label2Name = 'second <2>.lbl';"));
     }
     void cleanupTestCase() { qunsetenv("Temp"); }
     void init()
@@ -72,28 +70,20 @@ private slots:
         QTest::addColumn<QStringList>("absent");
         const QString empty = kTitleEnd + QStringLiteral("</table>"), defs = QStringLiteral("הגדרות לקוח/ספק");
         QTest::newRow("apostrophe") << "O'Neil" << "" << QStringList{"<b>O&#39;Neil</b>"} << QStringList{empty};
-        QTest::newRow("double quote") << "Q\"1" << "" << QStringList{"<b>Q&quot;1</b>"} << QStringList{empty};
         QTest::newRow("hebrew") << "מפתח" << "" << QStringList{"<b>מפתח</b>", "<td>שלום</td>", "<td>0.5</td>"} << QStringList{};
         QTest::newRow("markup") << "<b>&1" << ""
                                 << QStringList{"<b>&lt;b&gt;&amp;1</b>", "<td>Nut &amp; &lt;Bolt&gt;</td>", "<td>A&amp;B</td>"}
                                 << QStringList{"<Bolt>"};
-        QTest::newRow("200 characters") << kLong << "" << QStringList{"<b>" + kLong + "</b>"} << QStringList{empty};
         QTest::newRow("mixed case") << "mix-1" << "" << QStringList{"<b>MiX-1</b>"} << QStringList{empty};
-        for (const QString& none : {QStringLiteral("Q\"2"), QStringLiteral("אין"), QStringLiteral("<b>"),
-                                    QString(200, 'M'), QStringLiteral("A1' OR '1'='1")})
-            QTest::addRow("none: %s", qPrintable(none.left(12))) << none << "" << QStringList{empty} << QStringList{"<b>"};
+        QTest::newRow("none: quoted condition") << "A1' OR '1'='1" << "" << QStringList{empty} << QStringList{"<b>"};
         // The item's sections, in order; empty cells keep their borders.
         QTest::newRow("sections") << "A1" << ""
-                                  << QStringList{"<td>Retail &lt;A&amp;B&gt;</td>\r\n     <td>4.75</td>\r\n     <td>ILS</td>",
-                                                 "<td>O&#39;Brien</td>\r\n     <td>4.50</td>",
-                                                 "<td>Zed</td>\r\n     <td>12,345.50</td>\r\n     <td>&nbsp;</td>",
-                                                 "<td>OB-A1</td>\r\n     <td>OBBAR1</td>"}
+                                  << QStringList{"Retail &lt;A&amp;B&gt;", "O&#39;Brien", "12,345.50", "OBBAR1"}
                                   << QStringList{defs};
         QTest::newRow("no sections") << "B1" << "" << QStringList{"<td>&nbsp;</td>"}
                                      << QStringList{"מחירונים", "מחירים מיוחדים", "מפתחות חליפיים"};
         QTest::newRow("account") << "A1" << "o'brien"
-                                 << QStringList{defs, "<td>O&#39;Brien</td>\r\n     <td>3</td>\r\n     <td>main.lbl</td>\r\n"
-                                                      "     <td dir=ltr>second &lt;2&gt;.lbl</td>"}
+                                 << QStringList{defs, "<td>main.lbl</td>", "<td dir=ltr>second &lt;2&gt;.lbl</td>"}
                                  << QStringList{};
         QTest::newRow("account without definitions") << "A1" << "Nobody" << QStringList{"OB-A1"} << QStringList{defs};
     }
@@ -119,7 +109,6 @@ private slots:
     {
         TagoraInfo(pages, prompt).OpenItemHTML(QStringLiteral("  A1 "), data->docs);
         QCOMPARE(pages->shown, QStringList({waitPath(), cardPath()}));
-        QVERIFY(cardPath().endsWith(QStringLiteral("/vnicrd2.htm")));
         QVERIFY(readPage(cardPath()).contains(QStringLiteral("<b>A1</b>")));
         QVERIFY(prompt->lines().isEmpty());
     }
@@ -155,12 +144,8 @@ private slots:
         QVERIFY(!TagoraInfo(pages, prompt).CreateItemHTML(cardPath(), QStringLiteral("A1"), database, account));
     }
 
-    // A browser shows the card right to left. The check reads the layout the
-    // browser computed (the body's direction, where characters and cells lie)
-    // rather than comparing a screenshot: a picture would depend on the fonts
-    // installed and could only be judged by pixels, while the boxes answer the
-    // question itself, and also fail when the page's code page is misread
-    // (the Hebrew word is then not found at all).
+    // A browser shows the card right to left: read from the layout it computed,
+    // not a screenshot (fonts vary); a misread code page loses the Hebrew word.
     void browserReadsRightToLeft()
     {
         const QString chromium = QStandardPaths::findExecutable(QStringLiteral("chromium"));

@@ -61,7 +61,6 @@ void TstCupsJob::refused_data()
     QTest::addColumn<QString>("printer");
     QTest::addColumn<bool>("fileThere");
     QTest::newRow("rejecting queue") << QString::fromLatin1(cupsqueue::kRejectQueue) << true;
-    QTest::newRow("no such queue") << QStringLiteral("tagora-none") << true;
     QTest::newRow("file missing") << QString::fromLatin1(cupsqueue::kPdfQueue) << false;
 }
 
