@@ -1,7 +1,11 @@
+#include "support/dbrows.h"
+
 #include "erp/democompany.h"
+#include "erp/docimport.h"
 #include "erp/itemimport.h"
 #include "erp/odbc.h"
 #include "erp/textconv.h"
+#include "localdb/schema.h"
 
 #include <QRegularExpression>
 #include <QTemporaryDir>
@@ -56,50 +60,16 @@ QStringList column(const Rows& rows, int c)
     const Rows var = query(db, sql, &var##Error);                                                                      \
     QVERIFY2(var##Error.isEmpty(), qPrintable(var##Error))
 
-// A document-type recipe of the supplied configuration and the selections a
-// document import makes from it.
-struct Recipe {
-    bool account = false;
-    QVariant vType;
-    QString h, l, id, date, docCs, noDraft, cs, csId;
-
-    QString criteria(bool drafts, const QVariant& from = {}, const QVariant& to = {}, short connType = 2) const
-    {
-        QString s = vType.isNull() ? QString() : u" AND %1.TYPE = '%2'"_s.arg(h, vType.toString());
-        s += u" AND %1.%2 >= 0"_s.arg(h, id);
-        if (!from.isNull())
-            s += u" And %1.%2 >= %3"_s.arg(h, date, DateToErpLiteral(from, connType));
-        if (!to.isNull())
-            s += u" And %1.%2 <= %3"_s.arg(h, date, DateToErpLiteral(to, connType));
-        return s + (drafts || noDraft.isEmpty() ? QString() : u" And %1.%2"_s.arg(h, noDraft));
-    }
-    // The documents, joined to their accounts when the type has them.
-    QString from(const QString& crit, bool withAccount = true) const
-    {
-        return u" FROM "_s + h
-            + (account && withAccount ? u", %1 WHERE %1.%2 = %3.%4"_s.arg(cs, csId, h, docCs) : u" WHERE (1 > 0)"_s) + crit;
-    }
-    QString docs(const QString& crit) const { return u"SELECT %1.%2"_s.arg(h, id) + from(crit); }
-    QString count(const QString& crit, bool withAccount = true) const
-    {
-        return u"SELECT COUNT(%1.%2)"_s.arg(h, id) + from(crit, withAccount);
-    }
-    QString lines(const QVariant& doc) const
-    {
-        return u"SELECT %1.LINE FROM %1, PART WHERE PART.PART = %1.PART AND %1.%2 = %3 ORDER BY %1.LINE"_s.arg(l, id, doc.toString());
-    }
-    QString itemsOnDocs(const QString& crit) const
-    {
-        return u" And PART.PART In (SELECT DISTINCT %2.PART FROM %1, %2 WHERE %2.%3 = %1.%3%4)"_s.arg(h, l, id, crit);
-    }
-};
-
 // The single number a query gives, or -1 when it fails.
-int count(const Database& db, const QString& sql)
+int count(const Database& db, const ErpQuery& q)
 {
     QString error;
-    const Rows rows = query(db, sql, &error);
+    const Rows rows = query(db, q, &error);
     return error.isEmpty() ? rows.value(0).value(0).toInt() : -1;
+}
+int count(const Database& db, const QString& sql)
+{
+    return count(db, ErpQuery{sql, {}});
 }
 
 } // namespace
@@ -108,7 +78,7 @@ class TestDemoCompany : public QObject {
     Q_OBJECT
 
     QTemporaryDir m_dir;
-    std::vector<Recipe> m_recipes;
+    QVector<DocTypeRecipe> m_recipes;
 
     QString demoPath(int connType) const { return m_dir.filePath(u"demo%1.db"_s.arg(connType)); }
     static DemoOptions options(int connType)
@@ -133,22 +103,18 @@ private slots:
             const DbError e = CreateDemoErp(demoPath(t), options(t));
             QVERIFY2(!e, qPrintable(e.message));
         }
-        // The recipes as the supplied configuration carries them, so the two never drift apart.
-        const QString config = m_dir.filePath(u"tagora.tdb"_s);
-        QVERIFY(QFile::copy(u":/tagora/tagora.tdb"_s, config));
+        // The recipes as the supplied configuration carries them, every type
+        // included, so the two never drift apart.
+        const QString config = m_dir.filePath(dbfiles::Config), items = m_dir.filePath(dbfiles::Items);
+        QVERIFY(!InstallConfigDatabase(config) && !execOn(config, u"UPDATE tDocTypes SET Include = TRUE"_s));
+        DbError e;
+        QVERIFY(!CreateItemsDB(items, &e).isEmpty());
+        const QString docs = CreateTempDocsDB(config, items, m_dir.filePath(dbfiles::TempDocs), &e);
+        QVERIFY2(!docs.isEmpty(), qPrintable(e.message));
         Database db;
-        QVERIFY(!db.open(config, Database::OpenMode::ReadOnly));
-        QUERY(rs, db, u"SELECT d.CSTableID IN (1, 2), d.vTYPE, w.HeadTable, w.LineTable, w.fldID, w.fldDate,"
-                      " w.fldDocCSID, w.NoDraft, c.CSTableName, c.fldCSID FROM tDocTypes d"
-                      " JOIN tCSTable c ON c.CSTableID = d.CSTableID JOIN tWizFiles w ON w.WizFileID = d.WizFileID"
-                      " ORDER BY d.DocType"_s);
-        for (const QVariantList& row : rs) {
-            Recipe r{row[0].toBool(), row[1]};
-            QString* texts[] = {&r.h, &r.l, &r.id, &r.date, &r.docCs, &r.noDraft, &r.cs, &r.csId};
-            for (int i = 0; i < 8; ++i)
-                *texts[i] = row[2 + i].toString();
-            m_recipes.push_back(r);
-        }
+        QVERIFY(!db.open(docs, Database::OpenMode::ReadOnly));
+        m_recipes = ReadDocTypes(db, &e);
+        QVERIFY2(!e, qPrintable(e.message));
         QVERIFY(!m_recipes.empty());
     }
 
@@ -260,29 +226,33 @@ private slots:
     {
         QFETCH(int, connType);
         QFETCH(int, recipe);
-        QVERIFY(size_t(recipe) < m_recipes.size());
-        const Recipe& r = m_recipes[size_t(recipe)];
+        QVERIFY(recipe < m_recipes.size());
+        const DocTypeRecipe& r = m_recipes[recipe];
+        // The import's own selections, by dates of the connection type's kind.
+        auto crit = [&](bool drafts, const QVariant& from = {}, const QVariant& to = {}) {
+            return BuildDocRangeCriteria(r, from, to, {}, {}, 0, drafts, u"%"_s, short(connType));
+        };
         Database db;
         QVERIFY(!db.open(demoPath(connType), Database::OpenMode::ReadOnly));
-        const QString crit = r.criteria(false);
-        QUERY(docs, db, r.docs(crit));
+        QUERY(docs, db, docHeaderSql(r, 0, crit(false)));
         QVERIFY(!docs.isEmpty());
-        // Every document has its account.
-        QCOMPARE(count(db, r.count(crit, false)), int(docs.size()));
+        // Every document has its account: counted without the join, none more.
+        DocTypeRecipe unjoined = r;
+        unjoined.csTableId = 0;
+        QCOMPARE(count(db, docCountSql(unjoined, crit(false))), int(docs.size()));
         if (!r.noDraft.isEmpty())
-            QVERIFY(count(db, r.count(r.criteria(true))) > docs.size());
+            QVERIFY(count(db, docCountSql(r, crit(true))) > docs.size());
         for (const QVariantList& doc : docs) {
-            QUERY(lines, db, r.lines(doc[0]));
+            QUERY(lines, db, docLineSql(r, 0, doc[0].toLongLong()));
             QVERIFY(!lines.isEmpty());
             for (int l = 0; l < lines.size(); ++l)
-                QCOMPARE(lines[l][0].toInt(), l + 1);
+                QCOMPARE(lines[l][2].toInt(), l + 1);
         }
+        QVERIFY(count(db, docCountSql(r, crit(true, kToday.addDays(-30), kToday))) > 0);
+        QCOMPARE(count(db, docCountSql(r, crit(true, kToday.addDays(1)))), 0);
 
-        // The date bounds of the import select by the stored dates of either kind.
-        QVERIFY(count(db, r.count(r.criteria(true, kToday.addDays(-30), kToday, short(connType)))) > 0);
-        QCOMPARE(count(db, r.count(r.criteria(true, kToday.addDays(1), {}, short(connType)))), 0);
-
-        QUERY(items, db, itemQuerySql({}, {}, false, 0, false, r.itemsOnDocs(crit)));
+        const ErpQuery onDocs = BuildItemByDocCriteria(r.headTable, r.lineTable, r.fldID, crit(false));
+        QUERY(items, db, itemQuerySql({}, {}, false, 0, false, onDocs.sql, onDocs.params));
         QVERIFY(!items.isEmpty() && items.size() <= 40);
     }
 
@@ -392,22 +362,6 @@ private slots:
         QVERIFY(a.open(QIODevice::ReadOnly) && b.open(QIODevice::ReadOnly));
         QVERIFY(a.readAll() == b.readAll());
         QCOMPARE(DemoErpScript(options(1)), DemoErpScript(options(1)));
-    }
-
-    // The server script holds every table of the file, quotes doubled and dates of the type's kind.
-    void script_data() { connTypes(); }
-    void script()
-    {
-        QFETCH(int, connType);
-        const QString sql = DemoErpScript(options(connType));
-        Database db;
-        QVERIFY(!db.open(demoPath(connType), Database::OpenMode::ReadOnly));
-        for (const QString& table : db.tableNames())
-            QVERIFY2(sql.contains(u"CREATE TABLE %1 ("_s.arg(table)) && sql.contains(u"INSERT INTO %1 ("_s.arg(table)),
-                     qPrintable(table));
-        QVERIFY(sql.contains("'O''R-5'"_L1) && sql.trimmed().endsWith("COMMIT;"_L1));
-        QVERIFY(sql.contains(connType == 1 ? u"'%1'"_s.arg(kToday.toString(Qt::ISODate))
-                                           : QString::number(QDate(1988, 1, 1).daysTo(kToday) * 1440)));
     }
 };
 

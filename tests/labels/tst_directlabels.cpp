@@ -297,10 +297,8 @@ private slots:
         QTest::addColumn<int>("connType");
         QTest::addColumn<QString>("erpText");
         QTest::addColumn<QString>("shown");
-        QTest::newRow("type 1, Latin") << 1 << "Makita DHP482 (18V)" << "cells:Makita DHP482 (18V)";
         QTest::newRow("type 1, Hebrew") << 1 << "החדקמ" << "cells:החדקמ";
         QTest::newRow("type 1, mixed") << 1 << "(Makita 18V) החדקמ" << "cells:(Makita 18V) החדקמ";
-        QTest::newRow("type 2, Latin") << 2 << "Makita DHP482 (18V)" << "text:Makita DHP482 (18V)";
         QTest::newRow("type 2, Hebrew") << 2 << "מקדחה" << "text:מקדחה";
         QTest::newRow("type 2, mixed") << 2 << "מקדחה (Makita 18V) <2>" << "text:מקדחה (Makita 18V) <2>";
         QTest::newRow("type 1, emoji") << 1 << "😀 𝐀 החדקמ" << "cells:&#128512; &#119808; החדקמ";
@@ -641,7 +639,6 @@ private slots:
         QTest::newRow("many records, refusals spread") << 400 << 7 << 0;
         QTest::newRow("disk full midway") << 400 << 7 << 250;
         QTest::newRow("disk full at the first record") << 400 << 0 << 1;
-        QTest::newRow("disk full at the last record") << 400 << 7 << 400;
     }
     void picturesInRecordOrder()
     {
