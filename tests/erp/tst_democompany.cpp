@@ -125,7 +125,6 @@ private slots:
         QTest::addColumn<int>("plist");
         QTest::addColumn<bool>("joins"); // foreign names and warehouses
         for (int t : {1, 2}) {
-            QTest::addRow("type %d plain", t) << t << 40 << 0 << false;
             QTest::addRow("type %d 500 items, foreign and warehouse", t) << t << 500 << 0 << true;
             QTest::addRow("type %d base list", t) << t << 40 << 1 << false;
             QTest::addRow("type %d dollar list", t) << t << 40 << 3 << false;
