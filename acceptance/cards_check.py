@@ -167,9 +167,11 @@ def erp_expected(erp_path, key, conn_type, company):
     right = []
     names = {n: (txt(s) or f"פרמטר {n}") for n, s in db.execute("SELECT NUMBER, SPECDES FROM PARTSPECTYPES"
                                                                    " WHERE NUMBER > 0 ORDER BY NUMBER")}
+    # The check's own parameter table holds the item, then one column per
+    # parameter number, in order: a parameter's value is at its number.
     params = db.execute("SELECT * FROM PARTSPEC WHERE PART = ?", (part,)).fetchone()
     for n, name in names.items():
-        value = txt(params[f"SPEC{n}"]) if params else ""
+        value = txt(params[n]) if params else ""
         if value:
             right += [name + ":", value]
     he = [txt(r[0]) for r in db.execute("SELECT TEXT FROM PARTTEXT WHERE PART = ? ORDER BY TEXTORD", (part,))]

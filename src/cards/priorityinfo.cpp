@@ -338,10 +338,14 @@ void PriorityInfo::writeParameters(CardPage& page, ErpConnection& erp, const QVa
         return;
     const qlonglong first = names.begin()->first;
     const qlonglong last = names.rbegin()->first;
+    // The ERP names a parameter's column after its table, less the "PART"
+    // in front, followed by the parameter's number.
+    const QString table = QStringLiteral("PARTSPEC");
+    const QString column = table.mid(4);
     QString sql = QStringLiteral("SELECT PS.PART");
     for (qlonglong n = first; n <= last; ++n)
-        sql += QStringLiteral(", PS.SPEC") + QString::number(n);
-    sql += QStringLiteral(" FROM PARTSPEC PS WHERE PS.PART = ?");
+        sql += QStringLiteral(", PS.") + column + QString::number(n);
+    sql += QStringLiteral(" FROM ") + table + QStringLiteral(" PS WHERE PS.PART = ?");
     const auto values = sectionRows(erp, sql, byId, [&](const ErpRecordset& rs) {
         QStringList row;
         for (int i = 1; i < rs.columnCount(); ++i)
