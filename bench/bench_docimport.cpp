@@ -215,34 +215,6 @@ QString runForLine(const QString& self, const QStringList& args, const QString& 
     return child->ok && field(line, QStringLiteral("seconds")).toDouble() > 0 ? line : QString();
 }
 
-// A value as the shell reads it: the bench's own numbers and codes, quoted
-// and doubled where they are text.
-QString literal(const QVariant& v)
-{
-    switch (v.typeId()) {
-    case QMetaType::Int:
-    case QMetaType::LongLong:
-    case QMetaType::UInt:
-    case QMetaType::ULongLong:
-    case QMetaType::Double:
-        return v.toString();
-    default:
-        return QLatin1Char('\'') + v.toString().replace(QLatin1Char('\''), QStringLiteral("''")) + QLatin1Char('\'');
-    }
-}
-
-QString withLiterals(ErpQuery q)
-{
-    int from = 0;
-    for (const QVariant& v : q.params) {
-        const int at = q.sql.indexOf(QLatin1Char('?'), from);
-        const QString text = literal(v);
-        q.sql.replace(at, 1, text);
-        from = at + text.size();
-    }
-    return q.sql;
-}
-
 int bench(int items)
 {
     const QString self = QCoreApplication::applicationFilePath();
@@ -252,11 +224,7 @@ int bench(int items)
         return 1;
     }
     const QString dir = tmp.path();
-    if (!writeOdbcSetup(dir, QLatin1String(kDsn), erpPath(dir)))
-        return 1;
-
-    // The demo company, before any timing.
-    const Child demo = runChild(self, {QStringLiteral("--make-demo"), dir, QString::number(items)});
+    const Child demo = prepareDemo(self, dir, kDsn, items);
     if (!demo.ok)
         return 1;
     std::printf("document import: demo company of %d items, types %s with drafts, dates %s-%s\n", items, kTypes,
@@ -279,22 +247,20 @@ int bench(int items)
     if (types.isEmpty())
         return 1;
     {
-        QString script = QStringLiteral("ATTACH '%1' AS e;\nBEGIN;\n").arg(erpPath(dir));
+        // The shell takes no bound values: the bench's own numbers go in as literals.
+        QString statements;
         for (const DocTypeRecipe& r : types) {
-            const QString head = withLiterals(docHeaderSql(r, QtyLine, criteriaOf(r)));
+            const ErpQuery h = docHeaderSql(r, QtyLine, criteriaOf(r));
+            const QString head = ErpConnection::inlineSqliteValues(h.sql, h.params);
             const QString line = docLineSql(r, QtyLine, 0).sql.replace(
                 QStringLiteral(" = ? ORDER BY"), QStringLiteral(" IN (SELECT ID FROM h%1) ORDER BY").arg(r.docType));
-            script += QStringLiteral("CREATE TABLE h%1 AS %2 LIMIT 0;\nINSERT INTO h%1 %2;\n"
-                                     "CREATE TABLE l%1 AS %3 LIMIT 0;\nINSERT INTO l%1 %3;\n")
-                          .arg(r.docType)
-                          .arg(head, line);
+            statements += QStringLiteral("CREATE TABLE h%1 AS %2 LIMIT 0;\nINSERT INTO h%1 %2;\n"
+                                         "CREATE TABLE l%1 AS %3 LIMIT 0;\nINSERT INTO l%1 %3;\n")
+                              .arg(r.docType)
+                              .arg(head, line);
         }
-        script += QStringLiteral("COMMIT;\n");
-        QFile f(floorScript);
-        if (!f.open(QIODevice::WriteOnly) || f.write(script.toUtf8()) < 0) {
-            std::fprintf(stderr, "cannot write %s\n", qPrintable(floorScript));
+        if (!writeFloorScript(floorScript, erpPath(dir), statements))
             return 1;
-        }
     }
 
     // Five rounds: the import, the floor, then the reads alone, each in a process of its own.

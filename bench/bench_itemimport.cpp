@@ -117,11 +117,7 @@ int bench(int items)
         return 1;
     }
     const QString dir = tmp.path();
-    if (!writeOdbcSetup(dir, QLatin1String(kDsn), erpPath(dir)))
-        return 1;
-
-    // The demo company, before any timing.
-    const Child demo = runChild(self, {QStringLiteral("--make-demo"), dir, QString::number(items)});
+    const Child demo = prepareDemo(self, dir, kDsn, items);
     if (!demo.ok)
         return 1;
     std::printf("item import: %d items\n", items);
@@ -137,27 +133,19 @@ int bench(int items)
     const QString floorDb = dir + QStringLiteral("/floor.db");
     const QString floorScript = dir + QStringLiteral("/floor.sql");
     {
-        QString script = QStringLiteral("ATTACH '%1' AS e;\nBEGIN;\n").arg(erpPath(dir));
-        // The shell takes no bound values; these are the bench's own numbers.
-        auto literal = [](ErpQuery q) {
-            for (const QVariant& v : q.params)
-                q.sql.replace(q.sql.indexOf(QLatin1Char('?')), 1, v.toString());
-            return q.sql;
-        };
+        // The shell takes no bound values: the bench's own numbers go in as literals.
+        auto literal = [](const ErpQuery& q) { return ErpConnection::inlineSqliteValues(q.sql, q.params); };
         const QStringList queries = {
             literal(itemQuerySql({}, {}, false, 1, false, {})),
             literal(foreignNameQuerySql({}, {}, {})),
             literal(alterKeyQuerySql(false, {})),
             literal(priceListQuerySql({}, {}, {})),
         };
+        QString statements;
         for (int i = 0; i < queries.size(); ++i)
-            script += QStringLiteral("CREATE TABLE t%1 AS %2 LIMIT 0;\nINSERT INTO t%1 %2;\n").arg(i).arg(queries[i]);
-        script += QStringLiteral("COMMIT;\n");
-        QFile f(floorScript);
-        if (!f.open(QIODevice::WriteOnly) || f.write(script.toUtf8()) < 0) {
-            std::fprintf(stderr, "cannot write %s\n", qPrintable(floorScript));
+            statements += QStringLiteral("CREATE TABLE t%1 AS %2 LIMIT 0;\nINSERT INTO t%1 %2;\n").arg(i).arg(queries[i]);
+        if (!writeFloorScript(floorScript, erpPath(dir), statements))
             return 1;
-        }
     }
 
     // Five rounds: the import in a child process of its own, then the floor.

@@ -115,6 +115,30 @@ inline QString erpPath(const QString& dir)
     return dir + QStringLiteral("/erp.sqlite");
 }
 
+// A folder for one run, its ODBC set-up naming dsn, and the demo company made
+// in a child of its own before any timing. The child, with ok false when
+// anything failed (the reason is on standard error).
+inline Child prepareDemo(const QString& self, const QString& dir, const char* dsn, int items)
+{
+    if (!writeOdbcSetup(dir, QLatin1String(dsn), erpPath(dir)))
+        return Child{};
+    return runChild(self, {QStringLiteral("--make-demo"), dir, QString::number(items)});
+}
+
+// The floor's script for the sqlite3 shell: the statements copying the ERP's
+// result sets, with the ERP attached as "e", in one transaction.
+inline bool writeFloorScript(const QString& path, const QString& erpFile, const QString& statements)
+{
+    QFile f(path);
+    const QString script = QStringLiteral("ATTACH '%1' AS e;\nBEGIN;\n").arg(erpFile) + statements
+        + QStringLiteral("COMMIT;\n");
+    if (!f.open(QIODevice::WriteOnly) || f.write(script.toUtf8()) < 0) {
+        std::fprintf(stderr, "cannot write %s\n", qPrintable(path));
+        return false;
+    }
+    return true;
+}
+
 // --make-demo DIR ITEMS: the demo company at DIR/erp.sqlite.
 inline int makeDemo(const QString& dir, int items)
 {
