@@ -16,17 +16,16 @@ Exit status 0 when everything agrees, 1 otherwise.
 Python 3 standard library only; the SQLite ODBC driver must be installed.
 """
 
-import argparse
 import datetime as dt
 import difflib
 import html.parser
 import os
 import sqlite3
 import sys
-import tempfile
 import urllib.parse
 
-from checkrun import erp_text, finish, private_host, replace_section, run_cli, visual_to_logical, write_odbc
+from checkrun import (check_arguments, erp_text, finish, private_host, replace_section, run_cli,
+                      visual_to_logical, write_odbc)
 
 EPOCH = dt.date(1988, 1, 1)
 TODAY = dt.date.today()
@@ -403,14 +402,7 @@ def check_type(cli, work, conn_type):
 
 
 def main():
-    ap = argparse.ArgumentParser()
-    ap.add_argument("--cli", default="build/app/tagora-cli")
-    ap.add_argument("--keep")
-    ap.add_argument("--conn-types", default="2,1")
-    args = ap.parse_args()
-    args.cli = os.path.abspath(args.cli)
-    work = args.keep or tempfile.mkdtemp(prefix="cards-check-")
-    os.makedirs(work, exist_ok=True)
+    args, work = check_arguments(__doc__, "cards-check-", conn_types=True)
     summary = []
     for conn_type in (int(t) for t in args.conn_types.split(",")):
         summary += check_type(args.cli, work, conn_type)

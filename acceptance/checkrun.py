@@ -1,9 +1,11 @@
 """What the acceptance checks share: the ERP's text in reading order, the
 private ODBC data source, the settings file that points the headless host at
 it, running the host, and the closing summary."""
+import argparse
 import os
 import shutil
 import subprocess
+import tempfile
 
 
 def is_hebrew(c):
@@ -45,6 +47,27 @@ def erp_text(value, default, conn_type):
 
 
 # ------------------------------------------------------------------ the ERP
+
+
+def check_arguments(doc, prefix, seed=None, conn_types=False, more=None):
+    """The options every check takes (--cli, --keep; --seed and --conn-types
+    where it has them; more(parser) adds its own) and its work folder.
+    Gives (args, work)."""
+    ap = argparse.ArgumentParser(description=doc.splitlines()[0])
+    root = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
+    ap.add_argument("--cli", default=os.path.join(root, "build", "app", "tagora-cli"))
+    ap.add_argument("--keep", help="work in this folder and leave it behind")
+    if seed is not None:
+        ap.add_argument("--seed", type=int, default=seed)
+    if conn_types:
+        ap.add_argument("--conn-types", default="2,1", help="ERP connection types to check (1, 2)")
+    if more:
+        more(ap)
+    args = ap.parse_args()
+    args.cli = os.path.abspath(args.cli)
+    work = os.path.abspath(args.keep or tempfile.mkdtemp(prefix=prefix))
+    os.makedirs(work, exist_ok=True)
+    return args, work
 
 
 def private_host(folder):

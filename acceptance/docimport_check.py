@@ -13,7 +13,6 @@ Exit status 0 when every run agrees, 1 otherwise.
 Python 3 standard library only.
 """
 
-import argparse
 import datetime as dt
 import os
 import random
@@ -21,9 +20,8 @@ import shutil
 import sqlite3
 import subprocess
 import sys
-import tempfile
 
-from checkrun import finish, run_cli, write_odbc, write_settings
+from checkrun import check_arguments, finish, run_cli, write_odbc, write_settings
 
 EPOCH = dt.datetime(1988, 1, 1)
 BOUNDARY = dt.date(2026, 3, 15)  # the day the date ranges of the runs cut across
@@ -450,16 +448,7 @@ def factor_value(text):
 
 
 def main():
-    ap = argparse.ArgumentParser(description=__doc__.splitlines()[0])
-    root = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
-    ap.add_argument("--cli", default=os.path.join(root, "build", "app", "tagora-cli"))
-    ap.add_argument("--seed", type=int, default=7_304_219)
-    ap.add_argument("--keep", help="work in this folder and leave it behind")
-    ap.add_argument("--conn-types", default="2,1", help="ERP connection types to check (1, 2)")
-    args = ap.parse_args()
-
-    work = args.keep or tempfile.mkdtemp(prefix="docimport-check-")
-    os.makedirs(work, exist_ok=True)
+    args, work = check_arguments(__doc__, "docimport-check-", seed=7_304_219, conn_types=True)
 
     summary = []
     for conn_type in [int(x) for x in args.conn_types.split(",")]:

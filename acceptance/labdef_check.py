@@ -20,7 +20,6 @@ Exit status 0 when everything agrees, 1 otherwise.
 Python 3 standard library only; Chromium is needed for the last part.
 """
 
-import argparse
 import configparser
 import html
 import os
@@ -29,9 +28,8 @@ import shutil
 import sqlite3
 import subprocess
 import sys
-import tempfile
 
-from checkrun import finish, private_host, run_cli
+from checkrun import check_arguments, finish, private_host, run_cli
 
 LINE_KEYS = ["UseCell", "FldID", "ViewType", "Align", "Font", "FontSize", "FontWeight", "FontUL",
              "FontItalic", "Direction", "Prefix", "Height", "Border"]
@@ -337,12 +335,7 @@ def check_direct(cli, env, ini, items, work):
 
 
 def main():
-    ap = argparse.ArgumentParser()
-    ap.add_argument("--cli", default="build/app/tagora-cli")
-    ap.add_argument("--keep")
-    args = ap.parse_args()
-    args.cli = os.path.abspath(args.cli)
-    work = args.keep or tempfile.mkdtemp(prefix="labdef-check-")
+    args, work = check_arguments(__doc__, "labdef-check-")
     env, ini, temp = private_host(work)
     demo = os.path.join(work, "demo")
     r = run_cli(args.cli, env, ini, ["--demo", demo])

@@ -15,16 +15,14 @@ Exit status 0 when everything agrees, 1 otherwise.
 Python 3 standard library only.
 """
 
-import argparse
 import os
 import random
 import shutil
 import sqlite3
 import subprocess
 import sys
-import tempfile
 
-from checkrun import erp_text, finish, is_hebrew, run_cli, visual_to_logical, write_odbc, write_settings
+from checkrun import check_arguments, erp_text, finish, is_hebrew, run_cli, visual_to_logical, write_odbc, write_settings
 
 SEP = "\u05f0"  # the cell separator of the cell form of a text
 DEFAULT_LABEL = "/labels/default'%_.lbl"
@@ -388,16 +386,7 @@ def check_editors(cli, env, ini, data, out):
 
 
 def main():
-    ap = argparse.ArgumentParser(description=__doc__.splitlines()[0])
-    root = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
-    ap.add_argument("--cli", default=os.path.join(root, "build", "app", "tagora-cli"))
-    ap.add_argument("--seed", type=int, default=4_117_003)
-    ap.add_argument("--keep", help="work in this folder and leave it behind")
-    ap.add_argument("--conn-types", default="2,1", help="ERP connection types to check (1, 2)")
-    args = ap.parse_args()
-
-    work = os.path.abspath(args.keep or tempfile.mkdtemp(prefix="plates-check-"))
-    os.makedirs(work, exist_ok=True)
+    args, work = check_arguments(__doc__, "plates-check-", seed=4_117_003, conn_types=True)
     summary = []
     for conn_type in [int(x) for x in args.conn_types.split(",")]:
         rng = random.Random(args.seed + conn_type)

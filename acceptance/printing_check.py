@@ -21,7 +21,6 @@ library; cupsd, glabels-3-batch, chromium, pdftotext, pdftoppm, pdfinfo and
 zbarimg must be installed (scripts/setup.sh installs them).
 """
 
-import argparse
 import glob
 import os
 import re
@@ -29,11 +28,10 @@ import socket
 import sqlite3
 import subprocess
 import sys
-import tempfile
 import threading
 import time
 
-from checkrun import finish, private_host, replace_section, run_cli
+from checkrun import check_arguments, finish, private_host, replace_section, run_cli
 
 ROOT = os.path.dirname(os.path.dirname(os.path.abspath(__file__)))
 COPIES = [2, 1, 3]
@@ -209,13 +207,8 @@ def check_direct(cli, env, ini, items, out_file, work):
 
 
 def main():
-    ap = argparse.ArgumentParser()
-    ap.add_argument("--cli", default="build/app/tagora-cli")
-    ap.add_argument("--keep")
-    ap.add_argument("--port", type=int, default=63141)
-    args = ap.parse_args()
-    args.cli = os.path.abspath(args.cli)
-    work = args.keep or tempfile.mkdtemp(prefix="printing-check-")
+    args, work = check_arguments(
+        __doc__, "printing-check-", more=lambda ap: ap.add_argument("--port", type=int, default=63141))
     env, ini, temp = private_host(work)
     # cupsd writes the queue's file as its own user: it must be able to pass
     # through the work folder (mkdtemp makes it private).

@@ -105,7 +105,8 @@ short MainCard::RunOLE(const QString& DefaultLabelName, short /*Copies*/, uchar 
     // A bridge the settings choose serves the program: its labels reach the
     // printer chosen on the general tab, or stay in the job folder.
     const QString progId = LabelProgram::progId(pServerType);
-    if (const QString bridge = ChosenBridge(*m_services.settings, progId); !progId.isEmpty() && !bridge.isEmpty()) {
+    const QString bridge = progId.isEmpty() ? QString() : ChosenBridge(*m_services.settings, progId);
+    if (!bridge.isEmpty()) {
         const QString folder = directJobFolder();
         QString problem = IsKnownBridge(bridge) ? PrepareJobFolder(folder)
                                                 : QStringLiteral("גשר ההדפסה '%1' אינו מוכר").arg(bridge);

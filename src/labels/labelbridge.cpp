@@ -58,6 +58,12 @@ bool argCount(const QString& member, const QVariantList& args, int least, QStrin
     return false;
 }
 
+// Automation names are matched as the programs match them, without regard to case.
+bool named(const QString& member, const char* name)
+{
+    return member.compare(QLatin1String(name), Qt::CaseInsensitive) == 0;
+}
+
 // NiceLabel's quantity text: copies, a comma, and a zero ("3,0").
 int quantityCopies(const QVariant& quantity)
 {
@@ -77,7 +83,7 @@ public:
     bool call(const QString& member, const QVariantList& args, QVariant* result, QString* error) override
     {
         Session& s = *m_session;
-        auto is = [&member](const char* name) { return member.compare(QLatin1String(name), Qt::CaseInsensitive) == 0; };
+        auto is = [&member](const char* name) { return named(member, name); };
         switch (m_kind) {
         case Kind::NiceLabel:
             if (is("LabelOpen")) {
@@ -139,7 +145,7 @@ public:
 
     std::shared_ptr<AutomationObject> object(const QString& member, const QVariantList& args, QString* error) override
     {
-        auto is = [&member](const char* name) { return member.compare(QLatin1String(name), Qt::CaseInsensitive) == 0; };
+        auto is = [&member](const char* name) { return named(member, name); };
         const QString path = m_progId + QLatin1Char('.') + member;
         if (m_kind == Kind::CodeSoft && is("ActiveDocument"))
             return std::make_shared<ProgramObject>(m_session, Kind::CodeSoftDocument, path);
@@ -160,7 +166,7 @@ public:
     bool setProperty(const QString& name, const QVariant& value, QString* error) override
     {
         Session& s = *m_session;
-        auto is = [&name](const char* n) { return name.compare(QLatin1String(n), Qt::CaseInsensitive) == 0; };
+        auto is = [&name](const char* n) { return named(name, n); };
         if ((m_kind == Kind::CodeSoft || m_kind == Kind::BarTender) && is("Visible"))
             return true;
         if (m_kind == Kind::CodeSoftVariable && is("Value"))
@@ -201,7 +207,7 @@ std::shared_ptr<AutomationObject> BridgeProvider::create(const QString& progId, 
                                                             {"BarTender.Application", Kind::BarTender},
                                                             {"FastLabel.FastLabelX", Kind::FastLabel}};
     for (const auto& [id, kind] : programs) {
-        if (progId.compare(QLatin1String(id), Qt::CaseInsensitive) != 0)
+        if (!named(progId, id))
             continue;
         auto session = std::make_shared<Session>();
         session->sink = m_factory ? m_factory(progId) : nullptr;
